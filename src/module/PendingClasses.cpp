@@ -1,0 +1,23 @@
+// Classes of the table whose behaviour is not built yet: they exist, count towards the
+// module lock and answer IUnknown only, so the class table and its factories are complete.
+#include "com/ComObject.h"
+#include "module/ClassCreators.h"
+
+namespace {
+class PendingObject : public ComObjectRoot, public IUnknown {
+public:
+    BEGIN_INTERFACE_TABLE(PendingObject)
+        INTERFACE_ENTRY(IUnknown)
+    END_INTERFACE_TABLE()
+};
+}  // namespace
+
+HRESULT CreateCalvexReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversShellView(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversEnumIDList(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversExtractIcon(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversContextMenu(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversDataObject(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateCalvexReceiversQueryInfo(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+HRESULT CreateBrennorReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
+void CalvexFolderStartStop(bool) {}

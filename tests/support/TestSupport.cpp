@@ -1,0 +1,114 @@
+#include "support/TestSupport.h"
+
+#include <shellapi.h>
+
+#include <algorithm>
+#include <cstdlib>
+
+namespace testsupport {
+
+std::wstring UnixToWindowsPath(const std::string& unixPath) {
+    std::wstring path = L"Z:" + Wide(unixPath);
+    for (auto& c : path)
+        if (c == L'/') c = L'\\';
+    return path;
+}
+
+static std::wstring DirFromEnvironment(const char* name) {
+    const char* value = std::getenv(name);
+    return value ? UnixToWindowsPath(value) : std::wstring();
+}
+
+std::wstring BuildDir() { return DirFromEnvironment("CALVEX_BUILD_DIR"); }
+std::wstring SourceDir() { return DirFromEnvironment("CALVEX_SOURCE_DIR"); }
+std::wstring ModuleDllPath() { return BuildDir() + L"\\CalvexReceiversShellExt.dll"; }
+
+void PumpMessagesFor(DWORD milliseconds) {
+    PumpUntil([] { return false; }, milliseconds);
+}
+
+bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds) {
+    const ULONGLONG end = GetTickCount64() + timeoutMilliseconds;
+    for (;;) {
+        MSG msg;
+        while (PeekMessageW(&msg, nullptr, 0, 0, PM_REMOVE)) {
+            TranslateMessage(&msg);
+            DispatchMessageW(&msg);
+        }
+        if (done()) return true;
+        ULONGLONG now = GetTickCount64();
+        if (now >= end) return false;
+        MsgWaitForMultipleObjects(0, nullptr, FALSE, static_cast<DWORD>(std::min<ULONGLONG>(end - now, 20)),
+                                  QS_ALLINPUT);
+    }
+}
+
+std::wstring TraceLogPath() {
+    wchar_t dir[MAX_PATH] = L"";
+    GetTempPathW(MAX_PATH, dir);
+    return std::wstring(dir) + L"CalvexReceiversShellExt.log";
+}
+
+std::string ReadTraceLog() {
+    HANDLE file = CreateFileW(TraceLogPath().c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE,
+                              nullptr, OPEN_EXISTING, 0, nullptr);
+    if (file == INVALID_HANDLE_VALUE) return std::string();
+    std::string bytes;
+    char buffer[65536];
+    DWORD read = 0;
+    while (ReadFile(file, buffer, sizeof buffer, &read, nullptr) && read > 0) bytes.append(buffer, read);
+    CloseHandle(file);
+    return bytes;
+}
+
+std::vector<std::string> TraceMessages() {
+    std::vector<std::string> messages;
+    const std::string log = ReadTraceLog();
+    size_t start = 0;
+    while (start < log.size()) {
+        size_t end = log.find('\n', start);
+        std::string line = log.substr(start, end == std::string::npos ? std::string::npos : end + 1 - start);
+        size_t tab = line.find('\t');
+        messages.push_back(tab == std::string::npos ? line : line.substr(tab + 1));
+        if (end == std::string::npos) break;
+        start = end + 1;
+    }
+    return messages;
+}
+
+bool TraceContains(const std::string& message) {
+    return ReadTraceLog().find(message) != std::string::npos;
+}
+
+std::string Narrow(const std::wstring& text) {
+    int n = WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), nullptr, 0, nullptr, nullptr);
+    std::string out(static_cast<size_t>(n), '\0');
+    WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), &out[0], n, nullptr, nullptr);
+    return out;
+}
+
+std::wstring Wide(const std::string& text) {
+    int n = MultiByteToWideChar(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), nullptr, 0);
+    std::wstring out(static_cast<size_t>(n), L'\0');
+    MultiByteToWideChar(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), &out[0], n);
+    return out;
+}
+
+TempDirectory::TempDirectory(const std::wstring& name) {
+    wchar_t dir[MAX_PATH] = L"";
+    GetTempPathW(MAX_PATH, dir);
+    m_path = std::wstring(dir) + name + L"-" + std::to_wstring(GetCurrentProcessId()) + L"-" +
+             std::to_wstring(GetTickCount64());
+    CreateDirectoryW(m_path.c_str(), nullptr);
+}
+
+TempDirectory::~TempDirectory() {
+    std::wstring from = m_path + L'\0';  // SHFileOperation wants a double-terminated list
+    SHFILEOPSTRUCTW op = {};
+    op.wFunc = FO_DELETE;
+    op.pFrom = from.c_str();
+    op.fFlags = FOF_NO_UI;
+    SHFileOperationW(&op);
+}
+
+}  // namespace testsupport

@@ -1,0 +1,46 @@
+#pragma once
+// Helpers shared by the tests: paths of the build, message pumping, the trace file.
+#include <windows.h>
+
+#include <functional>
+#include <string>
+#include <vector>
+
+namespace testsupport {
+
+// "/work/x" -> "Z:\work\x" (Wine maps the Unix root to drive Z:).
+std::wstring UnixToWindowsPath(const std::string& unixPath);
+// The build and source trees, from CALVEX_BUILD_DIR / CALVEX_SOURCE_DIR set by ctest.
+std::wstring BuildDir();
+std::wstring SourceDir();
+std::wstring ModuleDllPath();  // the built CalvexReceiversShellExt.dll
+
+// Dispatches this thread's messages for the given time.
+void PumpMessagesFor(DWORD milliseconds);
+// Dispatches messages until done() or the timeout; returns done()'s last answer.
+bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
+
+std::wstring TraceLogPath();
+// The whole trace file as bytes (readable while the module holds it open).
+std::string ReadTraceLog();
+// The trace's messages without their time prefixes, split at "\n".
+std::vector<std::string> TraceMessages();
+bool TraceContains(const std::string& message);
+
+std::string Narrow(const std::wstring& text);
+std::wstring Wide(const std::string& text);
+
+// A fresh empty directory under %TEMP%, removed with its contents on destruction.
+class TempDirectory {
+public:
+    explicit TempDirectory(const std::wstring& name);
+    ~TempDirectory();
+    TempDirectory(const TempDirectory&) = delete;
+    TempDirectory& operator=(const TempDirectory&) = delete;
+    const std::wstring& Path() const { return m_path; }
+
+private:
+    std::wstring m_path;
+};
+
+}  // namespace testsupport
