@@ -1,13 +1,26 @@
 // main() of every test program: an apartment thread with COM and the common controls, as
-// in Explorer.
+// in Explorer, and a temporary directory of its own, so that the trace file of this
+// program ("%TEMP%\CalvexReceiversShellExt.log") is not shared with tests running beside it.
 #include <windows.h>
 #include <commctrl.h>
 #include <objbase.h>
 
+#include <string>
+
 #include <gtest/gtest.h>
+
+static void UsePrivateTempDirectory() {
+    wchar_t base[MAX_PATH] = L"";
+    GetTempPathW(MAX_PATH, base);
+    std::wstring dir = std::wstring(base) + L"calvex-test-" + std::to_wstring(GetCurrentProcessId());
+    CreateDirectoryW(dir.c_str(), nullptr);
+    SetEnvironmentVariableW(L"TMP", dir.c_str());
+    SetEnvironmentVariableW(L"TEMP", dir.c_str());
+}
 
 int main(int argc, char** argv) {
     ::testing::InitGoogleTest(&argc, argv);
+    UsePrivateTempDirectory();
     CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED);
     INITCOMMONCONTROLSEX controls = {sizeof controls, ICC_WIN95_CLASSES | ICC_ANIMATE_CLASS};
     InitCommonControlsEx(&controls);
