@@ -24,11 +24,6 @@ CriticalSection& FactoryLock() {
     return lock;
 }
 
-IClassFactory* NewFactory(CreateInstanceFn create) {
-    ComObject<ClassFactory>* factory = ComObject<ClassFactory>::CreateUncounted(create);
-    if (factory) factory->AddRef();  // the table's reference
-    return factory;
-}
 }  // namespace
 
 ClassEntry* ClassTableBegin() { return std::begin(g_classTable); }
@@ -39,7 +34,7 @@ HRESULT GetClassObjectFromTable(REFCLSID clsid, REFIID riid, void** ppv) {
         if (!IsEqualCLSID(clsid, *entry->clsid)) continue;
         if (!entry->cachedFactory) {
             CriticalSectionLock lock(FactoryLock());
-            if (!entry->cachedFactory) entry->cachedFactory = NewFactory(entry->createInstance);
+            if (!entry->cachedFactory) entry->cachedFactory = ClassFactory::CreateCached(entry->createInstance);
         }
         if (!entry->cachedFactory) return E_OUTOFMEMORY;
         return entry->cachedFactory->QueryInterface(riid, ppv);
