@@ -250,7 +250,7 @@ std::wstring Substitute(const std::wstring& script, const std::wstring& modulePa
         if (script[i] != L'%') {
             out += script[i];
         } else if (script.compare(i, 8, L"%MODULE%") == 0) {
-            out += modulePath;
+            for (wchar_t c : modulePath) out.append(c == L'\'' ? 2 : 1, c);  // the path stands inside '...'
             i += 7;
         } else if (script.compare(i, 2, L"%%") == 0) {
             out += L'%';

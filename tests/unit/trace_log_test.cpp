@@ -1,0 +1,106 @@
+// The trace file: entry layout, the narrow and wide entry points, whole entries under
+// concurrent writers.
+#include <windows.h>
+
+#include <regex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "support/TestSupport.h"
+#include "trace/TraceLog.h"
+
+namespace {
+const std::regex kPrefix(R"(^(\d\d):(\d\d):(\d\d)\.(\d{4})\t)");
+
+class TraceLogTest : public testing::Test {
+protected:
+    void SetUp() override { OpenTraceLog(); }
+    void TearDown() override { CloseTraceLog(); }
+};
+}  // namespace
+
+TEST_F(TraceLogTest, EntryIsLocalTimePrefixThenMessage) {
+    SYSTEMTIME before;
+    GetLocalTime(&before);
+    TraceA("CModuleApp::InitInstance\r\n");
+    const std::string log = testsupport::ReadTraceLog();
+    std::smatch match;
+    ASSERT_TRUE(std::regex_search(log, match, kPrefix)) << log;
+    EXPECT_EQ("CModuleApp::InitInstance\r\n", log.substr(match.length(0)));
+    EXPECT_EQ(before.wHour, std::stoi(match[1]));
+    EXPECT_LT(std::stoi(match[4]), 1000) << "milliseconds, zero-padded to four digits";
+}
+
+TEST_F(TraceLogTest, MessagesAreWrittenAsGiven) {
+    struct Case {
+        const char* name;
+        void (*write)();
+        const char* message;
+    } cases[] = {
+        {"empty format writes the prefix alone", [] { TraceA(""); }, ""},
+        {"narrow values", [] { TraceA("X::Y [0x%08X] %i %s\n", 0x8000FFFFu, -3, "z"); }, "X::Y [0x8000FFFF] -3 z\n"},
+        {"wide %s is a wide string", [] { TraceW(L"A::B %s [%u]\r\n", L"Calvex Receivers\\Z/5@COM3", 7u); },
+         "A::B Calvex Receivers\\Z/5@COM3 [7]\r\n"},
+        {"empty wide format", [] { TraceW(L""); }, ""},
+    };
+    for (const Case& c : cases) {
+        CloseTraceLog();
+        OpenTraceLog();  // recreated empty each time
+        c.write();
+        const std::string log = testsupport::ReadTraceLog();
+        ASSERT_EQ(14u + strlen(c.message), log.size()) << c.name;
+        EXPECT_TRUE(std::regex_search(log, kPrefix)) << c.name;
+        EXPECT_EQ(c.message, log.substr(14)) << c.name;
+    }
+}
+
+TEST_F(TraceLogTest, MessageWithoutLineEndRunsIntoTheNextPrefix) {
+    TraceA("first");
+    TraceA("second\r\n");
+    const std::string log = testsupport::ReadTraceLog();
+    ASSERT_EQ(2 * 14 + 5 + 8u, log.size());
+    EXPECT_EQ("first", log.substr(14, 5));
+    EXPECT_TRUE(std::regex_search(log.substr(19), kPrefix)) << "same line, next prefix";
+}
+
+TEST_F(TraceLogTest, WideMessageIsCutToItsCountOfUnits) {
+    // In a double-byte code page the converted text is longer than the UTF-16 count; only
+    // that many bytes are written, so the line end is lost on purpose.
+    LCID previous = GetThreadLocale();
+    ASSERT_TRUE(SetThreadLocale(MAKELCID(MAKELANGID(LANG_JAPANESE, SUBLANG_DEFAULT), SORT_DEFAULT)));
+    UINT codePage = 0;
+    GetLocaleInfoW(GetThreadLocale(), LOCALE_IDEFAULTANSICODEPAGE | LOCALE_RETURN_NUMBER,
+                   reinterpret_cast<LPWSTR>(&codePage), sizeof codePage / sizeof(wchar_t));
+    TraceW(L"\u3042\u3044\r\n");
+    SetThreadLocale(previous);
+    ASSERT_EQ(932u, codePage);
+    const std::string log = testsupport::ReadTraceLog();
+    ASSERT_EQ(14u + 4u, log.size());
+    EXPECT_EQ("\x82\xa0\x82\xa2", log.substr(14));
+}
+
+TEST_F(TraceLogTest, ConcurrentWritersNeverSplitAnEntry) {
+    const int kLines = 500;
+    auto writer = [](char tag) {
+        for (int i = 0; i < kLines; ++i) TraceA("T%c::Line %04d\r\n", tag, i);
+    };
+    std::thread a(writer, 'a'), b(writer, 'b');
+    a.join();
+    b.join();
+    const std::string log = testsupport::ReadTraceLog();
+    const std::regex entry(R"(\d\d:\d\d:\d\d\.\d{4}\tT[ab]::Line \d{4}\r\n)");
+    size_t position = 0;
+    int entries = 0;
+    std::smatch match;
+    std::string rest = log;
+    while (std::regex_search(rest, match, entry, std::regex_constants::match_continuous)) {
+        ++entries;
+        position += match.length(0);
+        rest = match.suffix();
+    }
+    EXPECT_EQ(2 * kLines, entries);
+    EXPECT_EQ(log.size(), position) << "nothing but whole entries";
+}
