@@ -1,0 +1,167 @@
+// The hidden notify window: folder paths posted to it come out as one SHChangeNotify each,
+// a second after the last of a burst, in ordinal order.
+#include <windows.h>
+#include <shlobj.h>
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "items/CCalvexReceiversNotifyWindow.h"
+#include "module/ModuleApp.h"
+#include "support/TestSupport.h"
+
+namespace {
+struct Notification {
+    LONG eventId;
+    UINT flags;
+    std::wstring path;
+    bool secondItemNull;
+    ULONGLONG tick;
+};
+std::vector<Notification> g_notifications;
+void (*g_duringNotify)() = nullptr;
+
+void WINAPI RecordNotify(LONG eventId, UINT flags, LPCVOID item1, LPCVOID item2) {
+    g_notifications.push_back({eventId, flags, static_cast<const wchar_t*>(item1), item2 == nullptr, GetTickCount64()});
+    if (auto during = g_duringNotify) {
+        g_duringNotify = nullptr;
+        during();
+    }
+}
+
+HGLOBAL PathBlock(const std::wstring& path) {
+    const size_t bytes = (path.size() + 1) * sizeof(wchar_t);
+    HGLOBAL block = GlobalAlloc(GHND, bytes);
+    memcpy(GlobalLock(block), path.c_str(), bytes);
+    GlobalUnlock(block);
+    return block;
+}
+
+void PostPath(const std::wstring& path) {
+    ASSERT_TRUE(PostMessageW(CCalvexReceiversNotifyWindow::GetNotifyWindow(), UpdateFolderMessage(), 0,
+                             reinterpret_cast<LPARAM>(PathBlock(path))));
+}
+
+const wchar_t kRoot[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
+
+class NotifyWindowTest : public testing::Test {
+protected:
+    void SetUp() override {
+        ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
+        g_notifications.clear();
+        CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
+    }
+    void TearDown() override {
+        CCalvexReceiversNotifyWindow::DestroyInstance();
+        CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
+    }
+};
+}  // namespace
+
+TEST_F(NotifyWindowTest, BurstOfOnePathGivesOneNotificationASecondAfterTheLast) {
+    const std::wstring path = std::wstring(kRoot) + L"\\123!Z#5!COM3";
+    ULONGLONG lastPost = 0;
+    for (int i = 0; i < 3; ++i) {
+        PostPath(path);
+        lastPost = GetTickCount64();
+        testsupport::PumpMessagesFor(400);
+    }
+    ASSERT_TRUE(testsupport::PumpUntil([] { return !g_notifications.empty(); }, 5000));
+    testsupport::PumpMessagesFor(1500);
+    ASSERT_EQ(1u, g_notifications.size());
+    const Notification& sent = g_notifications[0];
+    EXPECT_EQ(SHCNE_UPDATEDIR, sent.eventId);
+    EXPECT_EQ(0x1005u, sent.flags);
+    EXPECT_EQ(path, sent.path);
+    EXPECT_TRUE(sent.secondItemNull);
+    EXPECT_GE(sent.tick - lastPost, 900u);
+    EXPECT_LE(sent.tick - lastPost, 3000u);
+
+    const std::string narrow = testsupport::Narrow(path);
+    EXPECT_TRUE(testsupport::TraceContains("<==CCalvexReceiversNotifyWindow::BufferEventPath [" + narrow + "]\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("CCalvexReceiversNotifyWindow::BufferEventPath - set update timer\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("==>CCalvexReceiversNotifyWindow::SendUpdateEvents " + narrow + "\r\n"));
+}
+
+TEST_F(NotifyWindowTest, DistinctPathsGoOutOnceEachInOrdinalOrder) {
+    const std::wstring posted[] = {L"b", L"a", L"B", L"a", L"b"};
+    for (const std::wstring& leaf : posted) PostPath(std::wstring(kRoot) + L"\\" + leaf);
+    ASSERT_TRUE(testsupport::PumpUntil([] { return g_notifications.size() >= 3; }, 5000));
+    testsupport::PumpMessagesFor(1500);
+    const std::wstring expected[] = {L"B", L"a", L"b"};  // ordinal: upper case sorts first
+    ASSERT_EQ(3u, g_notifications.size());
+    for (size_t i = 0; i < 3; ++i) EXPECT_EQ(std::wstring(kRoot) + L"\\" + expected[i], g_notifications[i].path);
+}
+
+TEST_F(NotifyWindowTest, PathArrivingWhileSendingGoesOutASecondAfterwards) {
+    PostPath(L"first");
+    g_duringNotify = [] {
+        // Delivered at once on the window's thread: the window is busy sending.
+        SendMessageW(CCalvexReceiversNotifyWindow::GetNotifyWindow(), UpdateFolderMessage(), 0,
+                     reinterpret_cast<LPARAM>(PathBlock(L"second")));
+    };
+    ASSERT_TRUE(testsupport::PumpUntil([] { return g_notifications.size() >= 2; }, 6000));
+    ASSERT_EQ(2u, g_notifications.size());
+    EXPECT_EQ(L"first", g_notifications[0].path);
+    EXPECT_EQ(L"second", g_notifications[1].path);
+    EXPECT_GE(g_notifications[1].tick - g_notifications[0].tick, 900u);
+    EXPECT_TRUE(testsupport::TraceContains("CCalvexReceiversNotifyWindow::SendUpdateEvents - set update timer\r\n"));
+}
+
+TEST_F(NotifyWindowTest, OnlyTheUpdateTimerSends) {
+    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    ASSERT_NE(nullptr, window);
+    SendMessageW(window, UpdateFolderMessage(), 0, reinterpret_cast<LPARAM>(PathBlock(L"pending")));
+    struct { UINT_PTR timerId; size_t expectedCount; } cases[] = {{999, 0}, {1, 0}, {1000, 1}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.timerId);
+        EXPECT_EQ(0, SendMessageW(window, WM_TIMER, c.timerId, 0));
+        EXPECT_EQ(c.expectedCount, g_notifications.size());
+    }
+    testsupport::PumpMessagesFor(1500);
+    EXPECT_EQ(1u, g_notifications.size()) << "the set was emptied and the timer killed";
+}
+
+TEST_F(NotifyWindowTest, WindowIsHiddenOfItsClassAndKnowsItsObject) {
+    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    ASSERT_NE(nullptr, window);
+    EXPECT_EQ(window, CCalvexReceiversNotifyWindow::GetNotifyWindow());
+    wchar_t className[128] = L"";
+    GetClassNameW(window, className, 128);
+    EXPECT_STREQ(L"Calvex Receivers Shell Extension - Notify Window", className);
+    EXPECT_FALSE(IsWindowVisible(window));
+    EXPECT_EQ(0, GetWindowTextLengthW(window));
+    EXPECT_NE(0, GetWindowLongPtrW(window, GWLP_USERDATA));
+    EXPECT_EQ(GetCurrentThreadId(), GetWindowThreadProcessId(window, nullptr));
+
+    DestroyWindow(window);
+    HWND again = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    EXPECT_NE(nullptr, again);
+    EXPECT_TRUE(IsWindow(again)) << "a lost window is made again";
+}
+
+TEST_F(NotifyWindowTest, WindowOfAnEndedThreadIsMadeAgainOnTheAsker) {
+    HANDLE thread = CreateThread(
+        nullptr, 0, [](void*) -> DWORD { return CCalvexReceiversNotifyWindow::GetNotifyWindow() ? 0 : 1; }, nullptr,
+        0, nullptr);
+    ASSERT_NE(nullptr, thread);
+    EXPECT_EQ(WAIT_OBJECT_0, WaitForSingleObject(thread, 10000));
+    CloseHandle(thread);
+    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    ASSERT_NE(nullptr, window);
+    EXPECT_EQ(GetCurrentThreadId(), GetWindowThreadProcessId(window, nullptr));
+}
+
+TEST_F(NotifyWindowTest, UnloadDropsPendingPathsAndUnregistersTheClass) {
+    PostPath(L"never sent");
+    testsupport::PumpMessagesFor(200);
+    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    CCalvexReceiversNotifyWindow::DestroyInstance();
+    EXPECT_FALSE(IsWindow(window));
+    WNDCLASSW info;
+    EXPECT_FALSE(GetClassInfoW(GetModuleHandleW(nullptr), L"Calvex Receivers Shell Extension - Notify Window", &info));
+    testsupport::PumpMessagesFor(1500);
+    EXPECT_TRUE(g_notifications.empty());
+}
