@@ -16,7 +16,6 @@ HRESULT CreateCalvexReceiversShellFolder(IUnknown* o, REFIID r, void** p) { retu
 HRESULT CreateCalvexReceiversShellView(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversEnumIDList(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversExtractIcon(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-HRESULT CreateCalvexReceiversContextMenu(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversDataObject(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversQueryInfo(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateBrennorReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
