@@ -58,11 +58,9 @@ private:
 };
 }  // namespace
 
-CReceiversPidlMgr::CReceiversPidlMgr() {
-    if (FAILED(SHGetMalloc(&m_malloc))) m_malloc.Reset();
+CReceiversPidlMgr::CReceiversPidlMgr(IMalloc* malloc) : m_malloc(malloc) {
+    if (!m_malloc && FAILED(SHGetMalloc(&m_malloc))) m_malloc.Reset();
 }
-
-CReceiversPidlMgr::CReceiversPidlMgr(IMalloc* malloc) : m_malloc(malloc) {}
 
 LPITEMIDLIST CReceiversPidlMgr::Allocate(size_t bytes) const {
     return m_malloc ? static_cast<LPITEMIDLIST>(m_malloc->Alloc(bytes)) : nullptr;

@@ -46,10 +46,9 @@ static_assert(offsetof(ReceiverItem, data) + offsetof(ReceiverItemData, name) ==
 
 class CReceiversPidlMgr {
 public:
-    // The shell's task allocator (SHGetMalloc).
-    CReceiversPidlMgr();
-    // Another allocator, for tests.
-    explicit CReceiversPidlMgr(IMalloc* malloc);
+    // Lists come from the given allocator, or from the shell's task allocator (SHGetMalloc)
+    // when none is given; tests pass their own.
+    explicit CReceiversPidlMgr(IMalloc* malloc = nullptr);
     CReceiversPidlMgr(const CReceiversPidlMgr&) = delete;
     CReceiversPidlMgr& operator=(const CReceiversPidlMgr&) = delete;
 

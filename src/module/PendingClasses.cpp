@@ -14,9 +14,6 @@ public:
 
 HRESULT CreateCalvexReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversShellView(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-HRESULT CreateCalvexReceiversEnumIDList(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-HRESULT CreateCalvexReceiversExtractIcon(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversDataObject(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-HRESULT CreateCalvexReceiversQueryInfo(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateBrennorReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 void CalvexFolderStartStop(bool) {}
