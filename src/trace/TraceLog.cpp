@@ -22,26 +22,23 @@ void WriteBytes(const char* bytes, DWORD length) {
     WriteFile(g_traceFile, bytes, length, &written, nullptr);
 }
 
-std::string FormatA(const char* format, va_list args) {
-    va_list copy;
-    va_copy(copy, args);
-    int n = _vscprintf(format, copy);
-    va_end(copy);
-    if (n <= 0) return std::string();
-    std::string text(static_cast<size_t>(n) + 1, '\0');
-    _vsnprintf(&text[0], text.size(), format, args);
-    text.resize(static_cast<size_t>(n));
-    return text;
+int CountFormatted(const char* format, va_list args) { return _vscprintf(format, args); }
+int CountFormatted(const wchar_t* format, va_list args) { return _vscwprintf(format, args); }
+void PrintFormatted(char* out, size_t size, const char* format, va_list args) { _vsnprintf(out, size, format, args); }
+void PrintFormatted(wchar_t* out, size_t size, const wchar_t* format, va_list args) {
+    _vsnwprintf(out, size, format, args);
 }
 
-std::wstring FormatW(const wchar_t* format, va_list args) {
+// The Microsoft printf family on purpose: in the wide form %s takes a wide string.
+template <class Char>
+std::basic_string<Char> Format(const Char* format, va_list args) {
     va_list copy;
     va_copy(copy, args);
-    int n = _vscwprintf(format, copy);
+    int n = CountFormatted(format, copy);
     va_end(copy);
-    if (n <= 0) return std::wstring();
-    std::wstring text(static_cast<size_t>(n) + 1, L'\0');
-    _vsnwprintf(&text[0], text.size(), format, args);
+    if (n <= 0) return std::basic_string<Char>();
+    std::basic_string<Char> text(static_cast<size_t>(n) + 1, Char());
+    PrintFormatted(&text[0], text.size(), format, args);
     text.resize(static_cast<size_t>(n));
     return text;
 }
@@ -78,7 +75,7 @@ void TraceA(const char* format, ...) {
     WriteTracePrefix();
     va_list args;
     va_start(args, format);
-    std::string text = FormatA(format, args);
+    std::string text = Format(format, args);
     va_end(args);
     WriteBytes(text.data(), static_cast<DWORD>(text.size()));
 }
@@ -88,7 +85,7 @@ void TraceW(const wchar_t* format, ...) {
     WriteTracePrefix();
     va_list args;
     va_start(args, format);
-    std::wstring text = FormatW(format, args);
+    std::wstring text = Format(format, args);
     va_end(args);
     const size_t n = text.size();
     // Exactly n bytes go out, n being the count of UTF-16 units: a message whose code page
