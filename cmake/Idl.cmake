@@ -13,9 +13,10 @@ function(calvex_widl name idl)
            COMMAND ${WIDL_EXECUTABLE} ${flags} -u -o ${out}_i.c ${idl})
   if(ARG_TLB)
     list(APPEND outputs ${out}.tlb)
-    list(APPEND cmds COMMAND ${WIDL_EXECUTABLE} ${flags} -t -o ${out}.tlb ${idl})
+    list(APPEND cmds COMMAND ${WIDL_EXECUTABLE} ${flags} -t -o ${out}.tlb ${idl}
+                     COMMAND ${Python3_EXECUTABLE} ${CMAKE_SOURCE_DIR}/cmake/fix_tlb_libid.py ${out}.tlb ${idl})
   endif()
-  add_custom_command(OUTPUT ${outputs} ${cmds} DEPENDS ${idl}
+  add_custom_command(OUTPUT ${outputs} ${cmds} DEPENDS ${idl} ${CMAKE_SOURCE_DIR}/cmake/fix_tlb_libid.py
     COMMENT "widl ${name}" VERBATIM)
   set(${name}_IDL_OUTPUTS ${outputs} PARENT_SCOPE)
 endfunction()
