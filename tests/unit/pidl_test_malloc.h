@@ -39,6 +39,8 @@ public:
     size_t Outstanding() const { return m_blocks.size(); }
     size_t LastSize() const { return m_lastSize; }
     size_t Allocations() const { return m_allocations; }
+    // References held by others (the test's own one not counted).
+    ULONG HeldReferences() const { return m_refs - 1; }
 
     STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override {
         if (IsEqualIID(riid, IID_IUnknown) || IsEqualIID(riid, IID_IMalloc)) {
