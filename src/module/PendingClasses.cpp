@@ -12,8 +12,5 @@ public:
 };
 }  // namespace
 
-HRESULT CreateCalvexReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversShellView(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversDataObject(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-HRESULT CreateBrennorReceiversShellFolder(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
-void CalvexFolderStartStop(bool) {}

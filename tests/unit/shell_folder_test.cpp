@@ -1,0 +1,294 @@
+// The folder's answers about items, without a device manager: parsing, comparing, names,
+// attributes, identity, and the operations it refuses.
+#include <windows.h>
+#include <shlobj.h>
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "com/ComPtr.h"
+#include "folder/CBrennorReceiversShellFolder.h"
+#include "folder/CCalvexReceiversShellFolder.h"
+#include "module/ClassIds.h"
+#include "module/ModuleApp.h"
+#include "support/TestSupport.h"
+
+namespace {
+const wchar_t kKey[] = L"123!Z#5!COM3";
+const wchar_t kCalvexRoot[] = L"::{E102076F-4057-4e7f-8209-511258F12B62}";
+
+// A folder as Explorer gets it (made, then Initialize), or a receiver folder below a root
+// as BindToObject makes it, but without binding to the device manager.
+template <class T>
+class TestFolder {
+public:
+    explicit TestFolder(IReceiversShellFolderImpl* parent = nullptr, LPCITEMIDLIST pidl = nullptr) {
+        EXPECT_EQ(S_OK, CreateComObject<T>(&object));
+        if (parent) EXPECT_EQ(S_OK, object->Init(parent, pidl));
+        else EXPECT_EQ(S_OK, object->Initialize(nullptr));
+    }
+    ~TestFolder() { object->Release(); }
+    ComObject<T>* operator->() const { return object; }
+    ComObject<T>* Get() const { return object; }
+
+private:
+    ComObject<T>* object = nullptr;
+};
+
+class ShellFolderTest : public testing::Test {
+protected:
+    static void SetUpTestSuite() { ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized()); }  // the trace file
+    UniquePidl Item(DWORD type, const wchar_t* name, DWORD size = 0, DATE time = 0) {
+        UniquePidl item(mgr, mgr.Create(type, name));
+        if (ReceiverItemData* data = mgr.GetData(item.Get())) {
+            data->size = size;
+            data->time = time;
+        }
+        return item;
+    }
+    std::wstring Take(STRRET& name) {
+        std::wstring text = name.uType == STRRET_WSTR && name.pOleStr ? name.pOleStr : L"<not a string>";
+        CoTaskMemFree(name.pOleStr);
+        return text;
+    }
+    CReceiversPidlMgr mgr;
+};
+}  // namespace
+
+TEST_F(ShellFolderTest, GetAttributesOfReplacesTheMaskWithWhatAllItemsShare) {
+    UniquePidl receiver = Item(3, kKey), brennor = Item(4, kKey), file = Item(6, L"A.qpr"), root = Item(1, L"R");
+    struct { std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
+        {{}, 0xFFFFFFFF},
+        {{file.Get()}, 0x02000001},
+        {{receiver.Get()}, 0x22000000},
+        {{brennor.Get(), receiver.Get()}, 0x22000000},
+        {{root.Get()}, 0xA2000000},
+        {{receiver.Get(), file.Get()}, 0x02000000},
+        {{root.Get(), file.Get()}, 0x02000000},
+    };
+    TestFolder<CCalvexReceiversShellFolder> folder;
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.items.size());
+        SFGAOF attributes = SFGAO_CANDELETE | SFGAO_CANMOVE;  // asked for, and ignored
+        EXPECT_EQ(S_OK, folder->GetAttributesOf(static_cast<UINT>(c.items.size()),
+                                                const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
+        EXPECT_EQ(c.expected, attributes);
+    }
+    LPCITEMIDLIST one[] = {file.Get()};
+    EXPECT_EQ(S_FALSE, folder->GetAttributesOf(1, one, nullptr));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::GetAttributesOf - attributes is collected [33554432]\r\n"));
+}
+
+TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
+    UniquePidl big = Item(6, L"B.qpr", 10, 40000.5), small = Item(6, L"A.qpr", 3, 40000.5);
+    UniquePidl later = Item(6, L"C.qpr", 3, 40001.0), huge = Item(6, L"H.qpr", 0x80000000u, 0);
+    UniquePidl one = Item(6, L"O.qpr", 1, 0), receiverA = Item(3, L"ABC!m!p"), receiverB = Item(3, L"abd!m!p");
+    UniquePidl receiverA2 = Item(3, L"abc!M!P"), empty(mgr, mgr.Copy(nullptr));
+    struct { LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
+        {2, big.Get(), small.Get(), 14},                 // 7 * 2
+        {-2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
+        {-2, small.Get(), big.Get(), 14},
+        {2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
+        {3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
+        {3, small.Get(), big.Get(), 3},                  // ... in both orders
+        {-3, small.Get(), big.Get(), -3},
+        {3, big.Get(), later.Get(), -3},
+        {3, later.Get(), big.Get(), 3},
+        {2, receiverA.Get(), receiverB.Get(), 0},        // size and time only for files
+        {3, receiverA.Get(), receiverB.Get(), 0},
+        {0, receiverA.Get(), big.Get(), 0},              // different kinds
+        {0, receiverA.Get(), receiverA2.Get(), 0},       // names ignore case
+        {-1, receiverA.Get(), receiverA2.Get(), 0},
+    };
+    TestFolder<CCalvexReceiversShellFolder> folder;
+    for (const auto& c : cases) {
+        SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
+        EXPECT_EQ(c.expected, folder->CompareIDs(c.lParam, c.first, c.second));
+    }
+    // Names: the sign of _wcsicmp, multiplied out.
+    const HRESULT ascending = folder->CompareIDs(0, receiverA.Get(), receiverB.Get());
+    EXPECT_LT(ascending, 0);
+    EXPECT_EQ(-ascending, folder->CompareIDs(-1, receiverA.Get(), receiverB.Get()));
+    EXPECT_EQ(ascending * 4, folder->CompareIDs(4, receiverA.Get(), receiverB.Get()));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CompareIDs ID1=ABC!m!p, ID2=abd!m!p\r\n"));
+}
+
+TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
+    TestFolder<CCalvexReceiversShellFolder> root;
+    TestFolder<CBrennorReceiversShellFolder> brennor;
+    UniquePidl receiverItem = Item(3, kKey);
+    TestFolder<CCalvexReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
+    struct {
+        IShellFolder* folder;
+        const wchar_t* name;
+        HRESULT result;
+        UINT count;
+        DWORD type;
+        const wchar_t* itemName;
+    } cases[] = {
+        {root.Get(), kKey, S_OK, 1, 3, kKey},
+        {root.Get(), L"//123!Z#5!COM3\\", S_OK, 1, 3, kKey},
+        {brennor.Get(), kKey, S_OK, 1, 4, kKey},
+        {receiver.Get(), L"FILE.qpr", S_OK, 1, 6, L"FILE.qpr"},
+        {root.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},  // the file part b\c is one item
+        {receiver.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(testing::Message() << testsupport::Narrow(c.name));
+        LPITEMIDLIST pidl = reinterpret_cast<LPITEMIDLIST>(1);
+        ULONG eaten = 77, attributes = 88;
+        std::wstring name = c.name;
+        EXPECT_EQ(c.result, c.folder->ParseDisplayName(nullptr, nullptr, &name[0], &eaten, &pidl, &attributes));
+        EXPECT_EQ(77u, eaten);
+        EXPECT_EQ(88u, attributes);
+        UniquePidl owned(mgr, pidl);
+        ASSERT_EQ(c.count, mgr.GetItemCount(pidl));
+        if (c.count) {
+            EXPECT_EQ(c.type, mgr.GetLastItemType(pidl));
+            EXPECT_EQ(c.itemName, mgr.GetItemName(pidl));
+        }
+    }
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::ParseDisplayName - nParts [3] >= nItems [3]\r\n"));
+}
+
+TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
+    TestFolder<CCalvexReceiversShellFolder> root;
+    TestFolder<CBrennorReceiversShellFolder> brennor;
+    UniquePidl receiverItem = Item(3, kKey), file = Item(6, L"FILE.qpr");
+    TestFolder<CCalvexReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
+    const std::wstring calvexParsing = std::wstring(kCalvexRoot) + L"\\" + kKey;
+    struct {
+        IShellFolder* folder;
+        LPCITEMIDLIST item;
+        SHGDNF flags;
+        HRESULT result;
+        std::wstring name;
+    } cases[] = {
+        {root.Get(), receiverItem.Get(), SHGDN_NORMAL, S_OK, L"Z/5@COM3"},
+        {root.Get(), receiverItem.Get(), SHGDN_INFOLDER, S_OK, L"Z/5@COM3"},
+        {root.Get(), receiverItem.Get(), SHGDN_FORADDRESSBAR, S_OK, L"Z/5@COM3"},
+        {root.Get(), receiverItem.Get(), SHGDN_FORADDRESSBAR | SHGDN_INFOLDER, S_OK, L"Z/5@COM3"},
+        {root.Get(), receiverItem.Get(), SHGDN_FORPARSING, S_OK, calvexParsing},
+        {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | SHGDN_INFOLDER, S_OK, kKey},
+        {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | 2, S_OK, L""},
+        {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | SHGDN_FORADDRESSBAR, E_INVALIDARG, L""},
+        {root.Get(), receiverItem.Get(), SHGDN_FOREDITING, E_INVALIDARG, L""},
+        {root.Get(), receiverItem.Get(), SHGDN_INFOLDER | SHGDN_FOREDITING, E_INVALIDARG, L""},
+        {root.Get(), receiverItem.Get(), 2, E_INVALIDARG, L""},
+        {brennor.Get(), receiverItem.Get(), SHGDN_FORPARSING,
+         S_OK, std::wstring(L"::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\") + kKey},
+        {receiver.Get(), file.Get(), SHGDN_FORPARSING, S_OK, calvexParsing + L"\\FILE.qpr"},
+        {receiver.Get(), file.Get(), SHGDN_NORMAL, S_OK, L"FILE.qpr"},
+    };
+    for (auto& c : cases) {
+        SCOPED_TRACE(testing::Message() << "flags 0x" << std::hex << c.flags);
+        STRRET name = {};
+        EXPECT_EQ(c.result, c.folder->GetDisplayNameOf(c.item, c.flags, &name));
+        if (c.result == S_OK) {
+            EXPECT_EQ(c.name, Take(name));
+        }
+    }
+}
+
+TEST_F(ShellFolderTest, IdentityAndInterfaces) {
+    TestFolder<CCalvexReceiversShellFolder> calvex;
+    TestFolder<CBrennorReceiversShellFolder> brennor;
+    IPersistFolder* folders[] = {calvex.Get(), brennor.Get()};
+    for (IPersistFolder* folder : folders) {
+        CLSID clsid = GUID_NULL;
+        EXPECT_EQ(S_OK, folder->GetClassID(&clsid));
+        EXPECT_TRUE(IsEqualCLSID(CLSID_CalvexReceiversShellFolder, clsid)) << "both brands report the Calvex class";
+        struct { const IID* iid; HRESULT result; } interfaces[] = {
+            {&IID_IShellFolder, S_OK}, {&IID_IPersistFolder, S_OK}, {&IID_IPersist, S_OK},
+            {&IID_IShellFolder2, S_OK}, {&IID_IPersistFolder2, E_NOINTERFACE}, {&IID_IShellView, E_NOINTERFACE},
+        };
+        for (const auto& i : interfaces) {
+            ComPtr<IUnknown> other;
+            EXPECT_EQ(i.result, folder->QueryInterface(*i.iid, other.PutVoid()));
+        }
+        ComPtr<IUnknown> unknown, shellFolder;
+        folder->QueryInterface(IID_IUnknown, unknown.PutVoid());
+        folder->QueryInterface(IID_IShellFolder, shellFolder.PutVoid());
+        EXPECT_EQ(unknown.Get(), shellFolder.Get()) << "IUnknown is the first interface of the map";
+    }
+}
+
+TEST_F(ShellFolderTest, RefusedOperations) {
+    TestFolder<CCalvexReceiversShellFolder> folder;
+    UniquePidl file = Item(6, L"FILE.qpr");
+    LPCITEMIDLIST items[] = {file.Get(), file.Get()};
+    void* object = reinterpret_cast<void*>(1);
+    struct { const char* name; HRESULT result; HRESULT expected; const char* trace; } cases[] = {
+        {"BindToObject of a file", folder->BindToObject(file.Get(), nullptr, IID_IShellFolder, &object), E_INVALIDARG, nullptr},
+        {"BindToStorage", folder->BindToStorage(file.Get(), nullptr, IID_IStream, &object), E_NOTIMPL,
+         "IReceiversShellFolderImpl::BindToStorage\r\n"},
+        {"SetNameOf", folder->SetNameOf(nullptr, file.Get(), L"x", 0, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl::SetNameOf - NOTIMPL\r\n"},
+        {"GetUIObjectOf of two", folder->GetUIObjectOf(nullptr, 2, items, IID_IContextMenu, nullptr, &object), E_FAIL, nullptr},
+        {"GetUIObjectOf other", folder->GetUIObjectOf(nullptr, 1, items, IID_IShellFolder, nullptr, &object), E_NOINTERFACE, nullptr},
+        {"CreateViewObject other", folder->CreateViewObject(nullptr, IID_IDropTarget, &object), E_NOINTERFACE, nullptr},
+        {"GetDefaultSearchGUID", folder->GetDefaultSearchGUID(nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::GetDefaultSearchGUID - NOTIMPL\r\n"},
+        {"EnumSearches", folder->EnumSearches(nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::EnumSearches - NOTIMPL\r\n"},
+        {"GetDefaultColumn", folder->GetDefaultColumn(0, nullptr, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::GetDefaultColumn - NOTIMPL\r\n"},
+        {"GetDefaultColumnState", folder->GetDefaultColumnState(0, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::GetDefaultColumnState - NOTIMPL\r\n"},
+        {"GetDetailsEx", folder->GetDetailsEx(nullptr, nullptr, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::GetDetailsEx - NOTIMPL\r\n"},
+        {"GetDetailsOf", folder->GetDetailsOf(nullptr, 0, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::GetDetailsOf - NOTMIPL\r\n"},
+        {"MapColumnToSCID", folder->MapColumnToSCID(0, nullptr), E_NOTIMPL,
+         "IReceiversShellFolderImpl2::MapColumnToSCID - NOTIMPL\r\n"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        EXPECT_EQ(c.expected, c.result);
+        if (c.trace) {
+            EXPECT_TRUE(testsupport::TraceContains(c.trace));
+        }
+    }
+    EXPECT_EQ(nullptr, object);
+}
+
+TEST_F(ShellFolderTest, ItemObjectsDescribeTheAbsoluteItem) {
+    TestFolder<CBrennorReceiversShellFolder> root;
+    UniquePidl receiverItem = Item(4, kKey), file = Item(6, L"FILE.qpr");
+    TestFolder<CBrennorReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
+    LPCITEMIDLIST items[] = {file.Get()};
+
+    ComPtr<IExtractIconW> icon;
+    ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IExtractIconW, nullptr, icon.PutVoid()));
+    int index = -1;
+    UINT flags = 0;
+    EXPECT_EQ(S_OK, icon->GetIconLocation(0, nullptr, 0, &index, &flags));
+    EXPECT_EQ(5, index);
+
+    ComPtr<IQueryInfo> info;
+    ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IQueryInfo, nullptr, info.PutVoid()));
+    LPWSTR tip = nullptr;
+    ASSERT_EQ(S_OK, info->GetInfoTip(0, &tip));
+    EXPECT_STREQ(L"Calvex Receivers\\123!Z#5!COM3\\FILE.qpr", tip) << "root, receiver and file";
+    CoTaskMemFree(tip);
+
+    ComPtr<IContextMenu> menu;
+    EXPECT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IContextMenu, nullptr, menu.PutVoid()));
+    EXPECT_TRUE(menu);
+}
+
+TEST_F(ShellFolderTest, InitTracesTheFullParsingPath) {
+    TestFolder<CBrennorReceiversShellFolder> root;
+    UniquePidl receiverItem = Item(4, kKey);
+    TestFolder<CBrennorReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
+    const std::wstring full = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\" +
+                              std::wstring(kKey);
+    EXPECT_EQ(full, receiver->GetFullPath());
+    EXPECT_EQ(L"Calvex Receivers\\123!Z#5!COM3", receiver->FolderPath(false));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + testsupport::Narrow(full) + "\r\n"));
+
+    wchar_t small[20];
+    EXPECT_FALSE(receiver->GetFolderPath(small, 20, false)) << "16 + 1 + 12 characters do not fit in 20";
+    EXPECT_STREQ(L"", small);
+}
