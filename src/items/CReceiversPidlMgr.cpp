@@ -34,7 +34,9 @@ DWORD ReceiverType(DWORD brand) {
 }
 
 // Appends into a caller's buffer of `capacity` units and never past it: at most
-// capacity - 1 units and a terminator, none at all for a capacity of 0.
+// capacity - 1 units and a terminator, none at all for a capacity of 0. It remembers the
+// whole text's last unit and how much of it did not fit, so that dropping a trailing
+// separator that never reached the buffer gives the same result as if it had.
 class BoundedText {
 public:
     BoundedText(wchar_t* buffer, UINT capacity) : m_buffer(buffer), m_capacity(buffer ? capacity : 0) {
@@ -42,19 +44,31 @@ public:
     }
     void Append(const std::wstring& text) {
         for (wchar_t c : text) {
-            if (m_length + 1 >= m_capacity) break;
-            m_buffer[m_length++] = c;
+            m_last = c;
+            if (m_length + 1 < m_capacity) {
+                m_buffer[m_length++] = c;
+            } else {
+                ++m_unwritten;
+            }
         }
         if (m_capacity) m_buffer[m_length] = L'\0';
     }
-    bool EndsWith(wchar_t c) const { return m_length > 0 && m_buffer[m_length - 1] == c; }
-    void DropLast() { m_buffer[--m_length] = L'\0'; }
+    bool EndsWith(wchar_t c) const { return (m_length > 0 || m_unwritten > 0) && m_last == c; }
+    void DropLast() {
+        if (m_unwritten > 0) {
+            --m_unwritten;
+        } else {
+            m_buffer[--m_length] = L'\0';
+        }
+    }
     UINT Length() const { return m_length; }
 
 private:
     wchar_t* m_buffer;
     UINT m_capacity;
     UINT m_length = 0;
+    UINT m_unwritten = 0;
+    wchar_t m_last = L'\0';
 };
 }  // namespace
 
