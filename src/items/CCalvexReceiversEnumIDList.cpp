@@ -108,12 +108,8 @@ bool CCalvexReceiversEnumIDList::ListReceivers(const std::wstring& path, IUnknow
         std::wstring key;
         if (!ReadReceiverKey(item.Get(), brand, &key)) continue;
         // The path as given, not the default root name: the folder always gives one.
-        LPITEMIDLIST pidl = m_pidlMgr.CreateLastFromPath((path + L"\\" + key).c_str(), brand);
-        if (!pidl) continue;
-        if (!AddToEnumList(pidl)) {
-            m_pidlMgr.Delete(pidl);
-            return false;
-        }
+        UniquePidl pidl(m_pidlMgr, m_pidlMgr.CreateLastFromPath((path + L"\\" + key).c_str(), brand));
+        if (pidl && !AddToEnumList(pidl)) return false;
     }
     return true;
 }
@@ -139,24 +135,21 @@ bool CCalvexReceiversEnumIDList::ListFiles(const std::wstring& path, bool withEx
         file->get_Size(&size);
         std::wstring itemPath = path + L"\\" + name.Str();
         if (withExtension) itemPath += L".qpr";
-        LPITEMIDLIST pidl = m_pidlMgr.CreateLastFromPath(itemPath.c_str(), brand);
-        if (!pidl) continue;
-        ReceiverItemData* data = m_pidlMgr.GetData(pidl);
+        UniquePidl pidl(m_pidlMgr, m_pidlMgr.CreateLastFromPath(itemPath.c_str(), brand));
+        if (!pidl) continue;  // an item that cannot be made is skipped
+        ReceiverItemData* data = m_pidlMgr.GetData(pidl.Get());
         data->size = static_cast<DWORD>(size);
         data->time = time;
-        if (!AddToEnumList(pidl)) {
-            m_pidlMgr.Delete(pidl);
-            return false;
-        }
+        if (!AddToEnumList(pidl)) return false;
     }
     return true;
 }
 
-bool CCalvexReceiversEnumIDList::AddToEnumList(LPITEMIDLIST pidl) {
+bool CCalvexReceiversEnumIDList::AddToEnumList(UniquePidl& pidl) {
     auto* node = static_cast<EnumNode*>(m_malloc->Alloc(sizeof(EnumNode)));
     if (!node) return false;
     node->next = nullptr;
-    node->pidl = pidl;
+    node->pidl = pidl.Release();
     if (m_last) {
         m_last->next = node;
     } else {

@@ -54,8 +54,8 @@ private:
 
     bool ListReceivers(const std::wstring& path, IUnknown* collection, DWORD brand);
     bool ListFiles(const std::wstring& path, bool withExtension, IUnknown* collection, DWORD brand);
-    // Takes the list on success; the caller still owns it on failure.
-    bool AddToEnumList(LPITEMIDLIST pidl);
+    // Takes the list on success; on failure (no node) the caller still owns it.
+    bool AddToEnumList(UniquePidl& pidl);
     void DeleteList();
 
     CReceiversPidlMgr m_pidlMgr;
