@@ -1,0 +1,159 @@
+// Both brand folders as Wine's own shell reaches them: parsed from the computer node, bound
+// with CoCreateInstance and IPersistFolder::Initialize, enumerated, walked into, and browsed
+// by Wine's ExplorerBrowser; against the simulated device manager and its sample receivers.
+#include <windows.h>
+#include <shlobj.h>
+#include <shlwapi.h>
+#include <shobjidl.h>
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <string>
+#include <vector>
+
+#include "com/ComPtr.h"
+#include "support/TestSupport.h"
+
+namespace {
+const wchar_t kComputer[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}";
+const wchar_t kCalvex[] = L"::{E102076F-4057-4e7f-8209-511258F12B62}";
+const wchar_t kBrennor[] = L"::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}";
+
+struct Listed {
+    std::wstring inFolder;  // SHGDN_FORPARSING | SHGDN_INFOLDER: the raw name
+    std::wstring normal;    // SHGDN_NORMAL: the display form
+    SFGAOF attributes;
+};
+
+LPITEMIDLIST ParseFromDesktop(const std::wstring& path) {
+    ComPtr<IShellFolder> desktop;
+    EXPECT_EQ(S_OK, SHGetDesktopFolder(&desktop));
+    std::wstring text = path;
+    LPITEMIDLIST pidl = nullptr;
+    EXPECT_EQ(S_OK, desktop->ParseDisplayName(nullptr, nullptr, &text[0], nullptr, &pidl, nullptr)) << testsupport::Narrow(path);
+    return pidl;
+}
+
+ComPtr<IShellFolder> BindFromDesktop(LPCITEMIDLIST pidl) {
+    ComPtr<IShellFolder> desktop, folder;
+    SHGetDesktopFolder(&desktop);
+    EXPECT_EQ(S_OK, desktop->BindToObject(pidl, nullptr, IID_IShellFolder, folder.PutVoid()));
+    return folder;
+}
+
+std::wstring NameOf(IShellFolder* folder, LPCITEMIDLIST child, SHGDNF flags) {
+    STRRET name = {};
+    if (FAILED(folder->GetDisplayNameOf(child, flags, &name))) return L"<failed>";
+    LPWSTR text = nullptr;
+    StrRetToStrW(&name, child, &text);
+    std::wstring result = text ? text : L"";
+    CoTaskMemFree(text);
+    return result;
+}
+
+// Every item of the folder, with the children's lists when asked for.
+std::vector<Listed> List(IShellFolder* folder, SHCONTF flags, std::vector<LPITEMIDLIST>* children = nullptr) {
+    std::vector<Listed> listed;
+    ComPtr<IEnumIDList> items;
+    EXPECT_EQ(S_OK, folder->EnumObjects(nullptr, flags, &items));
+    if (!items) return listed;
+    LPITEMIDLIST child = nullptr;
+    while (items->Next(1, &child, nullptr) == S_OK) {
+        SFGAOF attributes = 0xFFFFFFFF;
+        LPCITEMIDLIST one[] = {child};
+        folder->GetAttributesOf(1, one, &attributes);
+        listed.push_back({NameOf(folder, child, SHGDN_FORPARSING | SHGDN_INFOLDER), NameOf(folder, child, SHGDN_NORMAL),
+                          attributes});
+        if (children) children->push_back(child); else CoTaskMemFree(child);
+    }
+    return listed;
+}
+
+class ShellNamespaceTest : public testing::TestWithParam<const wchar_t*> {};
+}  // namespace
+
+TEST_P(ShellNamespaceTest, ParseBindEnumerateAndWalkIntoAReceiver) {
+    const std::wstring root = std::wstring(kComputer) + L"\\" + GetParam();
+    LPITEMIDLIST rootPidl = ParseFromDesktop(root);
+    ASSERT_NE(nullptr, rootPidl);
+    ComPtr<IShellFolder> folder = BindFromDesktop(rootPidl);
+    ASSERT_TRUE(folder);
+
+    std::vector<LPITEMIDLIST> children;
+    std::vector<Listed> receivers = List(folder.Get(), SHCONTF_FOLDERS | SHCONTF_NONFOLDERS, &children);
+    ASSERT_FALSE(receivers.empty()) << "the sample tree has receivers of both brands";
+    for (const Listed& receiver : receivers) {
+        SCOPED_TRACE(testsupport::Narrow(receiver.inFolder));
+        EXPECT_EQ(2, std::count(receiver.inFolder.begin(), receiver.inFolder.end(), L'!')) << "serial!model!port";
+        EXPECT_NE(std::wstring::npos, receiver.normal.find(L'@')) << "model@port";
+        EXPECT_EQ(0x22000000u, receiver.attributes);
+    }
+
+    // Into the first receiver: the files, and the same receiver reached by parsing its path.
+    ComPtr<IShellFolder> receiverFolder;
+    ASSERT_EQ(S_OK, folder->BindToObject(children[0], nullptr, IID_IShellFolder, receiverFolder.PutVoid()));
+    std::vector<Listed> files = List(receiverFolder.Get(), SHCONTF_NONFOLDERS);
+    for (const Listed& file : files) EXPECT_EQ(0x02000001u, file.attributes) << testsupport::Narrow(file.inFolder);
+    EXPECT_TRUE(List(receiverFolder.Get(), SHCONTF_FOLDERS).empty()) << "receivers hold no folders";
+
+    LPITEMIDLIST receiverPidl = ParseFromDesktop(root + L"\\" + receivers[0].inFolder);
+    ASSERT_NE(nullptr, receiverPidl);
+    ComPtr<IShellFolder> parsedFolder = BindFromDesktop(receiverPidl);
+    ASSERT_TRUE(parsedFolder);
+    EXPECT_EQ(files.size(), List(parsedFolder.Get(), SHCONTF_NONFOLDERS).size());
+
+    for (LPITEMIDLIST child : children) CoTaskMemFree(child);
+    CoTaskMemFree(receiverPidl);
+    CoTaskMemFree(rootPidl);
+
+    const std::string rootText = testsupport::Narrow(root);
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::EnumObjects Calvex Receivers\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\\" +
+                                           testsupport::Narrow(receivers[0].inFolder) + "\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("Advised for receivers, 0x"));
+    EXPECT_TRUE(testsupport::TraceContains("Advised for files, 0x"));
+}
+
+INSTANTIATE_TEST_SUITE_P(Brands, ShellNamespaceTest, testing::Values(kCalvex, kBrennor));
+
+TEST(ShellNamespace, BrandsListOnlyTheirOwnReceivers) {
+    std::vector<std::wstring> seen[2];
+    const wchar_t* roots[] = {kCalvex, kBrennor};
+    for (int i = 0; i < 2; ++i) {
+        LPITEMIDLIST pidl = ParseFromDesktop(std::wstring(kComputer) + L"\\" + roots[i]);
+        ComPtr<IShellFolder> folder = BindFromDesktop(pidl);
+        ASSERT_TRUE(folder);
+        for (const Listed& receiver : List(folder.Get(), SHCONTF_FOLDERS)) seen[i].push_back(receiver.inFolder);
+        CoTaskMemFree(pidl);
+        ASSERT_FALSE(seen[i].empty()) << "the sample tree has receivers of both brands";
+    }
+    for (const std::wstring& key : seen[0])
+        EXPECT_EQ(seen[1].end(), std::find(seen[1].begin(), seen[1].end(), key)) << testsupport::Narrow(key);
+}
+
+// Wine's ExplorerBrowser asks the folder for its view; until the folder has a view of its
+// own it gets E_NOINTERFACE and cannot show the folder. What holds now: the browser reaches
+// our folder, asks it for a view and fails cleanly, without hanging or crashing.
+TEST(ShellNamespace, ExplorerBrowserReachesTheFolderAndAsksForItsView) {
+    HWND host = CreateWindowExW(0, L"STATIC", L"host", WS_OVERLAPPEDWINDOW, 0, 0, 640, 480, nullptr, nullptr, nullptr, nullptr);
+    ASSERT_NE(nullptr, host);
+    ComPtr<IExplorerBrowser> browser;
+    ASSERT_EQ(S_OK, CoCreateInstance(CLSID_ExplorerBrowser, nullptr, CLSCTX_INPROC_SERVER, IID_IExplorerBrowser,
+                                     browser.PutVoid()));
+    RECT bounds = {0, 0, 640, 480};
+    FOLDERSETTINGS settings = {FVM_DETAILS, 0};
+    ASSERT_EQ(S_OK, browser->Initialize(host, &bounds, &settings));
+
+    LPITEMIDLIST rootPidl = ParseFromDesktop(std::wstring(kComputer) + L"\\" + kCalvex);
+    ASSERT_NE(nullptr, rootPidl);
+    const HRESULT hr = browser->BrowseToIDList(rootPidl, SBSP_ABSOLUTE);
+    testsupport::PumpMessagesFor(500);
+    EXPECT_TRUE(FAILED(hr)) << "no view yet";
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CreateViewObject from 0x"));
+    CoTaskMemFree(rootPidl);
+    browser->Destroy();
+    browser.Reset();
+    DestroyWindow(host);
+}
