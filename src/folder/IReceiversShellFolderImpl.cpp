@@ -440,8 +440,9 @@ HRESULT IReceiversShellFolderImpl::InitReceiverCollections() {
 HRESULT IReceiversShellFolderImpl::DoUpdateList() {
     if (m_updateTimer) CancelWaitableTimer(m_updateTimer.Get());
     TraceA("IReceiversShellFolderImpl::DoUpdateList\r\n");
-    if (GetFullPath().empty()) return S_FALSE;
-    PostPathToNotifyWindow();
+    const std::wstring path = GetFullPath();
+    if (path.empty()) return S_FALSE;
+    PostPathToNotifyWindow(path);
     // One view message five seconds after the last of a burst.
     FILETIME now;
     GetSystemTimeAsFileTime(&now);
@@ -453,8 +454,7 @@ HRESULT IReceiversShellFolderImpl::DoUpdateList() {
     return S_OK;
 }
 
-HRESULT IReceiversShellFolderImpl::PostPathToNotifyWindow() const {
-    const std::wstring path = GetFullPath();
+HRESULT IReceiversShellFolderImpl::PostPathToNotifyWindow(const std::wstring& path) {
     const size_t bytes = (path.size() + 1) * sizeof(wchar_t);
     UniqueGlobal block(GlobalAlloc(GHND, bytes));
     if (!block) return E_OUTOFMEMORY;

@@ -99,7 +99,7 @@ private:
     HRESULT BindSubFolder(LPCITEMIDLIST pidl, REFIID riid, void** ppv);
     HRESULT CreateItemObject(LPCITEMIDLIST item, REFIID riid, void** ppv);
     HRESULT DisplayName(LPCITEMIDLIST pidl, SHGDNF flags, std::wstring& name) const;
-    HRESULT PostPathToNotifyWindow() const;
+    static HRESULT PostPathToNotifyWindow(const std::wstring& path);
     void RemoveViewWindowLocked(HWND hwnd);
     void DeleteEventSinks();
     static DWORD WINAPI ThreadProc(void* self);
