@@ -1,0 +1,75 @@
+#include "SimDownload.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace {
+const size_t kChunk = 64 * 1024;
+}
+
+SimDownload::SimDownload(std::string bytes, ComPtr<IStream> stream, const SimTransferPlan& plan)
+    : m_bytes(std::move(bytes)), m_stream(std::move(stream)), m_plan(plan) {}
+
+BYTE SimDownload::Percent() const {
+    if (m_bytes.empty()) return 100;
+    return static_cast<BYTE>(static_cast<ULONGLONG>(m_written) * 100 / m_bytes.size());
+}
+
+bool SimDownload::End(HRESULT result, Event* event) {
+    m_ended = true;
+    m_stream.Reset();
+    *event = Event{Step::Finish, static_cast<BYTE>(std::max(m_reported, 0)), result};
+    return true;
+}
+
+bool SimDownload::Next(ULONGLONG now, Event* event) {
+    if (m_ended) return false;
+    if (!m_begun) {
+        m_begun = true;
+        m_start = now;
+        *event = Event{Step::Begin, 0, S_OK};
+        return true;
+    }
+    if (m_cancelled) return End(HRESULT_FROM_WIN32(ERROR_CANCELLED), event);
+    // The faults strike before the progress of their percent is reported.
+    if (m_plan.exitAtPercent >= 0 && Percent() >= m_plan.exitAtPercent) {
+        *event = Event{Step::Exit, Percent(), S_OK};
+        return true;
+    }
+    if (m_plan.failAtPercent >= 0 && Percent() >= m_plan.failAtPercent) return End(m_plan.failResult, event);
+    if (m_written == m_bytes.size()) {
+        if (m_reported < 100) {
+            m_reported = 100;  // an empty file reports its 100 here
+            *event = Event{Step::Progress, 100, S_OK};
+            return true;
+        }
+        LARGE_INTEGER start = {};
+        HRESULT hr = m_stream->Seek(start, STREAM_SEEK_SET, nullptr);
+        return End(SUCCEEDED(hr) ? S_OK : hr, event);
+    }
+    return WriteDue(now, event);
+}
+
+bool SimDownload::WriteDue(ULONGLONG now, Event* event) {
+    const size_t size = m_bytes.size();
+    const size_t due = m_plan.rate == 0 ? size
+                                        : static_cast<size_t>(std::min<ULONGLONG>(
+                                              size, (now - m_start) * m_plan.rate / 1000));
+    while (m_written < due) {
+        const size_t chunk = std::min(due - m_written, kChunk);
+        ULONG done = 0;
+        HRESULT hr = m_stream->Write(m_bytes.data() + m_written, static_cast<ULONG>(chunk), &done);
+        if (FAILED(hr)) return End(hr, event);
+        if (done != chunk) return End(STG_E_MEDIUMFULL, event);
+        m_written += chunk;
+        const BYTE percent = Percent();
+        if (percent == m_reported) continue;
+        if ((m_plan.exitAtPercent >= 0 && percent >= m_plan.exitAtPercent) ||
+            (m_plan.failAtPercent >= 0 && percent >= m_plan.failAtPercent))
+            return Next(now, event);  // the fault's turn, before this percent is reported
+        m_reported = percent;
+        *event = Event{Step::Progress, percent, S_OK};
+        return true;
+    }
+    return false;
+}
