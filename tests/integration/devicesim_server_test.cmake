@@ -1,0 +1,3 @@
+# Points the shared out-of-process simulator at its own trees, sets faults and kills it.
+set(TEST_SERIAL SERIAL)
+set(TEST_TIMEOUT 180)

@@ -1,0 +1,226 @@
+#include "support/DeviceSim.h"
+
+#include <tlhelp32.h>
+
+#include "com/Handles.h"
+
+namespace testsupport {
+
+namespace {
+
+const wchar_t kSimKey[] = L"Software\\Calvex\\DeviceSim";
+
+bool WriteBytes(const std::wstring& path, const std::string& bytes) {
+    UniqueFile file(CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr));
+    DWORD written = 0;
+    return file && WriteFile(file.Get(), bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr) &&
+           written == bytes.size();
+}
+
+std::string PatternBytes(size_t size, const std::wstring& seed) {
+    unsigned state = 2166136261u;
+    for (wchar_t c : seed) state = (state ^ c) * 16777619u;
+    std::string bytes(size, '\0');
+    for (char& b : bytes) {
+        state = state * 1103515245u + 12345u;
+        b = static_cast<char>(state >> 16);
+    }
+    return bytes;
+}
+
+bool IsSimulator(const wchar_t* exeName) {
+    const wchar_t* base = wcsrchr(exeName, L'\\');
+    base = base ? base + 1 : exeName;
+    return CompareStringOrdinal(base, -1, L"CalvexDeviceSim.exe", -1, TRUE) == CSTR_EQUAL;
+}
+
+}  // namespace
+
+std::wstring SampleReceiversDir() { return SourceDir() + L"\\sample-receivers"; }
+
+ReceiverTree::ReceiverTree() : m_dir(L"receivers") {}
+
+std::wstring ReceiverTree::AddReceiver(const SimReceiverSpec& spec) {
+    std::wstring text = L"[Receiver]\r\nBrand=" + std::to_wstring(spec.brand) + L"\r\nLabel=" + spec.label +
+                        L"\r\nSerialNumber=" + spec.serialNumber + L"\r\nModel=" + spec.model +
+                        L"\r\nPortType=" + std::to_wstring(spec.portType) + L"\r\nPortName=" + spec.portName + L"\r\n";
+    for (const std::wstring& line : spec.extraLines) text += line + L"\r\n";
+    WriteDescription(spec.folder, Narrow(text));
+    return FolderPath(spec.folder);
+}
+
+void ReceiverTree::WriteDescription(const std::wstring& folder, const std::string& text) {
+    CreateDirectoryW(FolderPath(folder).c_str(), nullptr);
+    WriteBytes(FolderPath(folder) + L"\\receiver.ini", text);
+}
+
+std::wstring ReceiverTree::AddFile(const std::wstring& folder, const std::wstring& name, const std::string& bytes) {
+    const std::wstring path = FolderPath(folder) + L"\\" + name;
+    WriteBytes(path, bytes);
+    return path;
+}
+
+std::wstring ReceiverTree::AddFile(const std::wstring& folder, const std::wstring& name, size_t size) {
+    return AddFile(folder, name, PatternBytes(size, folder + name));
+}
+
+bool ReceiverTree::RemoveFile(const std::wstring& folder, const std::wstring& name) {
+    return DeleteFileW((FolderPath(folder) + L"\\" + name).c_str()) != FALSE;
+}
+
+bool ReceiverTree::RemoveReceiver(const std::wstring& folder) {
+    const std::wstring path = FolderPath(folder);
+    WIN32_FIND_DATAW data;
+    HANDLE find = FindFirstFileW((path + L"\\*").c_str(), &data);
+    if (find != INVALID_HANDLE_VALUE) {
+        do {
+            if (!(data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)) DeleteFileW((path + L"\\" + data.cFileName).c_str());
+        } while (FindNextFileW(find, &data));
+        FindClose(find);
+    }
+    return RemoveDirectoryW(path.c_str()) != FALSE;
+}
+
+std::string ReadFileBytes(const std::wstring& path) {
+    UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
+                                nullptr, OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr));
+    std::string bytes;
+    char buffer[65536];
+    DWORD read = 0;
+    while (file && ReadFile(file.Get(), buffer, sizeof buffer, &read, nullptr) && read > 0) bytes.append(buffer, read);
+    return bytes;
+}
+
+bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
+
+void StopDeviceSimServers() {
+    std::vector<UniqueHandle> servers;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
+    PROCESSENTRY32W entry = {sizeof entry};
+    for (BOOL more = snapshot && Process32FirstW(snapshot.Get(), &entry); more;
+         more = Process32NextW(snapshot.Get(), &entry)) {
+        if (!IsSimulator(entry.szExeFile)) continue;
+        UniqueHandle process(OpenProcess(PROCESS_TERMINATE | SYNCHRONIZE, FALSE, entry.th32ProcessID));
+        if (process) servers.push_back(std::move(process));
+    }
+    // The server's event; a killed server would leave its class registered with Wine's rpcss.
+    UniqueHandle quit(OpenEventW(EVENT_MODIFY_STATE, FALSE, L"CalvexDeviceSim.Quit"));
+    if (quit) SetEvent(quit.Get());
+    for (const UniqueHandle& process : servers) {
+        // Pumped: the quitting server releases its proxies of this thread's sinks.
+        if (PumpUntil([&] { return WaitForSingleObject(process.Get(), 0) == WAIT_OBJECT_0; }, 10000)) continue;
+        TerminateProcess(process.Get(), 1);
+        WaitForSingleObject(process.Get(), 10000);
+    }
+    if (quit) ResetEvent(quit.Get());
+}
+
+void UseDeviceSimRoot(const std::wstring& root) {
+    StopDeviceSimServers();
+    RegSetKeyValueW(HKEY_CURRENT_USER, kSimKey, L"Root", REG_SZ, root.c_str(),
+                    static_cast<DWORD>((root.size() + 1) * sizeof(wchar_t)));
+}
+
+void SetDeviceSimValue(const wchar_t* name, DWORD value) {
+    RegSetKeyValueW(HKEY_CURRENT_USER, kSimKey, name, REG_DWORD, &value, sizeof value);
+}
+
+void SetDeviceSimCallFailure(const std::wstring& call, HRESULT result) {
+    DWORD value = static_cast<DWORD>(result);
+    RegSetKeyValueW(HKEY_CURRENT_USER, (std::wstring(kSimKey) + L"\\Fail").c_str(), call.c_str(), REG_DWORD, &value,
+                    sizeof value);
+}
+
+void RestoreDeviceSimDefaults() {
+    StopDeviceSimServers();
+    RegDeleteTreeW(HKEY_CURRENT_USER, kSimKey);
+}
+
+DeviceSimScope::DeviceSimScope(const std::wstring& root) {
+    RestoreDeviceSimDefaults();
+    if (!root.empty()) UseDeviceSimRoot(root);
+}
+
+DeviceSimScope::~DeviceSimScope() { RestoreDeviceSimDefaults(); }
+
+SimEventRecorder::~SimEventRecorder() {
+    Unadvise();
+    Clear();
+}
+
+ComPtr<SimEventRecorder> SimEventRecorder::Create(REFIID events) {
+    ComObject<SimEventRecorder>* object = nullptr;
+    CreateComObject<SimEventRecorder>(&object, events);
+    ComPtr<SimEventRecorder> recorder;
+    recorder.Attach(object);
+    return recorder;
+}
+
+STDMETHODIMP SimEventRecorder::GetTypeInfoCount(UINT* count) {
+    *count = 0;
+    return S_OK;
+}
+STDMETHODIMP SimEventRecorder::GetTypeInfo(UINT, LCID, ITypeInfo** info) {
+    *info = nullptr;
+    return E_NOTIMPL;
+}
+STDMETHODIMP SimEventRecorder::GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) { return E_NOTIMPL; }
+
+STDMETHODIMP SimEventRecorder::Invoke(DISPID id, REFIID, LCID, WORD, DISPPARAMS* params, VARIANT*, EXCEPINFO*,
+                                      UINT*) {
+    Event event{id, nullptr, {}};
+    VariantInit(&event.second);
+    if (params && params->cArgs >= 1) {
+        const VARIANT& first = params->rgvarg[params->cArgs - 1];
+        if (first.vt == VT_DISPATCH) event.subject = ComPtr<IDispatch>(first.pdispVal);
+        if (params->cArgs >= 2) VariantCopy(&event.second, &params->rgvarg[params->cArgs - 2]);
+    }
+    m_received.push_back(event);
+    return S_OK;
+}
+
+HRESULT SimEventRecorder::Advise(IUnknown* source) {
+    ComPtr<IConnectionPointContainer> container;
+    HRESULT hr = source->QueryInterface(IID_IConnectionPointContainer, container.PutVoid());
+    if (SUCCEEDED(hr)) hr = container->FindConnectionPoint(m_events, &m_point);
+    if (SUCCEEDED(hr)) hr = m_point->Advise(static_cast<IDispatch*>(this), &m_cookie);
+    return hr;
+}
+
+HRESULT SimEventRecorder::Unadvise() {
+    if (!m_point) return S_FALSE;
+    HRESULT hr = m_point->Unadvise(m_cookie);
+    m_point.Reset();
+    return hr;
+}
+
+size_t SimEventRecorder::Count(DISPID id) const {
+    size_t count = 0;
+    for (const Event& event : m_received) count += event.id == id;
+    return count;
+}
+
+bool SimEventRecorder::WaitFor(DISPID id, DWORD timeoutMilliseconds, size_t count) const {
+    return PumpUntil([&] { return Count(id) >= count; }, timeoutMilliseconds);
+}
+
+void SimEventRecorder::Clear() {
+    for (Event& event : m_received) VariantClear(&event.second);
+    m_received.clear();
+}
+
+std::wstring SubjectName(IDispatch* subject) {
+    if (!subject) return std::wstring();
+    BSTR text = nullptr;
+    ComPtr<IReceiverFile> file;
+    ComPtr<IReceiver> receiver;
+    if (SUCCEEDED(subject->QueryInterface(IID_IReceiverFile, file.PutVoid())))
+        file->get_Name(&text);
+    else if (SUCCEEDED(subject->QueryInterface(IID_IReceiver, receiver.PutVoid())))
+        receiver->get_SerialNumber(&text);
+    std::wstring name = text ? std::wstring(text, SysStringLen(text)) : std::wstring();
+    SysFreeString(text);
+    return name;
+}
+
+}  // namespace testsupport

@@ -1,0 +1,124 @@
+#pragma once
+// Test helpers around the simulated device manager: temporary receiver trees, and the one
+// out-of-process simulator that every test program of the Wine prefix shares. A test that
+// points the simulator elsewhere (or sets faults in the registry) changes it for everyone:
+// its test program must run alone (a sibling <stem>.cmake with set(TEST_SERIAL SERIAL)).
+#include <windows.h>
+
+#include <string>
+#include <vector>
+
+#include "CalvexDeviceMgrLib.h"
+#include "com/ComObject.h"
+#include "com/ComPtr.h"
+#include "support/TestSupport.h"
+
+namespace testsupport {
+
+// The sample tree of the repository, the simulator's default.
+std::wstring SampleReceiversDir();
+
+// The fields of one receiver's description file.
+struct SimReceiverSpec {
+    std::wstring folder;
+    long brand = 1;
+    std::wstring label = L"Test receiver";
+    std::wstring serialNumber = L"1000-0001";
+    std::wstring model = L"Q9 GNSS";
+    long portType = 2;
+    std::wstring portName;
+    // Further lines written as they stand, e.g. L"[Transfer]", L"Rate=11520".
+    std::vector<std::wstring> extraLines;
+};
+
+// A receiver tree under %TEMP%, removed with its contents at the end.
+class ReceiverTree {
+public:
+    ReceiverTree();
+    const std::wstring& Root() const { return m_dir.Path(); }
+    std::wstring FolderPath(const std::wstring& folder) const { return Root() + L"\\" + folder; }
+
+    // Makes the folder and writes its description file; returns the folder's path.
+    std::wstring AddReceiver(const SimReceiverSpec& spec);
+    // Writes the description file as given (UTF-8), for malformed ones.
+    void WriteDescription(const std::wstring& folder, const std::string& text);
+    // A file in a receiver's memory; returns its path.
+    std::wstring AddFile(const std::wstring& folder, const std::wstring& name, const std::string& bytes);
+    // A file of size bytes that differ from file to file.
+    std::wstring AddFile(const std::wstring& folder, const std::wstring& name, size_t size);
+    bool RemoveFile(const std::wstring& folder, const std::wstring& name);
+    bool RemoveReceiver(const std::wstring& folder);
+
+private:
+    TempDirectory m_dir;
+};
+
+std::string ReadFileBytes(const std::wstring& path);
+bool FileExists(const std::wstring& path);
+
+// Asks every running CalvexDeviceSim.exe of the prefix to quit (killed if it does not) and
+// waits until they are gone; this thread's messages are pumped meanwhile.
+void StopDeviceSimServers();
+// Points the out-of-process simulator at root; the next client starts a fresh server.
+void UseDeviceSimRoot(const std::wstring& root);
+// Global faults of the simulator (DWORD values of its registry key, and call failures).
+void SetDeviceSimValue(const wchar_t* name, DWORD value);
+void SetDeviceSimCallFailure(const std::wstring& call, HRESULT result);
+// Back to the sample tree without faults; any running server is ended.
+void RestoreDeviceSimDefaults();
+
+// Scope of a test that owns the out-of-process simulator: defaults before and after.
+class DeviceSimScope {
+public:
+    explicit DeviceSimScope(const std::wstring& root = std::wstring());
+    ~DeviceSimScope();
+    DeviceSimScope(const DeviceSimScope&) = delete;
+    DeviceSimScope& operator=(const DeviceSimScope&) = delete;
+};
+
+// A sink for any of the device manager's three event interfaces that records every call.
+// Subjects are kept, not read, inside the call: a handler never calls back into the server.
+class SimEventRecorder : public ComObjectRoot, public IDispatch {
+public:
+    struct Event {
+        DISPID id;
+        ComPtr<IDispatch> subject;
+        VARIANT second;  // VT_EMPTY when the event has one parameter
+    };
+
+    explicit SimEventRecorder(REFIID events) : m_events(events) {}
+    ~SimEventRecorder() override;
+    // A new recorder with one reference, owned by the caller.
+    static ComPtr<SimEventRecorder> Create(REFIID events);
+
+    BEGIN_INTERFACE_TABLE(SimEventRecorder)
+        INTERFACE_ENTRY(IDispatch)
+        INTERFACE_ENTRY_IID(DIID__IReceiversCollEvents, IDispatch)
+        INTERFACE_ENTRY_IID(DIID__IFilesCollEvents, IDispatch)
+        INTERFACE_ENTRY_IID(DIID__IReceiverFileEvents, IDispatch)
+    END_INTERFACE_TABLE()
+
+    STDMETHODIMP GetTypeInfoCount(UINT* count) override;
+    STDMETHODIMP GetTypeInfo(UINT, LCID, ITypeInfo** info) override;
+    STDMETHODIMP GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override;
+    STDMETHODIMP Invoke(DISPID id, REFIID, LCID, WORD, DISPPARAMS* params, VARIANT*, EXCEPINFO*, UINT*) override;
+
+    HRESULT Advise(IUnknown* source);
+    HRESULT Unadvise();
+    const std::vector<Event>& Events() const { return m_received; }
+    size_t Count(DISPID id) const;
+    // Waits (pumping messages) until an event id has arrived; false after the timeout.
+    bool WaitFor(DISPID id, DWORD timeoutMilliseconds, size_t count = 1) const;
+    void Clear();
+
+private:
+    IID m_events;
+    ComPtr<IConnectionPoint> m_point;
+    DWORD m_cookie = 0;
+    std::vector<Event> m_received;
+};
+
+// The name of what an event is about: a file's name or a receiver's serial number.
+std::wstring SubjectName(IDispatch* subject);
+
+}  // namespace testsupport
