@@ -1,0 +1,3 @@
+# Kills and unregisters the shared out-of-process simulator.
+set(TEST_SERIAL SERIAL)
+set(TEST_TIMEOUT 600)

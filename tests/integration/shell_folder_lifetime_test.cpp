@@ -1,0 +1,236 @@
+// Folder lifetimes against the out-of-process simulator: many folders bound and released
+// leave no thread, lock or handle behind; a device manager that dies or is not registered
+// leaves folders that fail or list nothing, without hanging or crashing.
+#include <windows.h>
+#include <shlobj.h>
+#include <tlhelp32.h>
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "com/ComPtr.h"
+#include "com/Handles.h"
+#include "module/ClassIds.h"
+#include "support/DeviceSim.h"
+#include "support/TestSupport.h"
+
+using namespace testsupport;
+
+namespace {
+using GetClassObjectFn = HRESULT(STDAPICALLTYPE*)(REFCLSID, REFIID, void**);
+using CanUnloadNowFn = HRESULT(STDAPICALLTYPE*)();
+
+size_t ThreadCount() {
+    size_t count = 0;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPTHREAD, 0));
+    THREADENTRY32 entry = {sizeof entry};
+    for (BOOL more = Thread32First(snapshot.Get(), &entry); more; more = Thread32Next(snapshot.Get(), &entry))
+        if (entry.th32OwnerProcessID == GetCurrentProcessId()) ++count;
+    return count;
+}
+
+// Threads of this process whose start routine lies in the module: the folders' own threads.
+size_t ThreadsStartedIn(HMODULE module) {
+    using QueryThreadFn = LONG(WINAPI*)(HANDLE, int, void*, ULONG, ULONG*);
+    auto query = reinterpret_cast<QueryThreadFn>(GetProcAddress(GetModuleHandleW(L"ntdll.dll"), "NtQueryInformationThread"));
+    const auto* image = reinterpret_cast<const BYTE*>(module);
+    const auto* headers = reinterpret_cast<const IMAGE_NT_HEADERS*>(
+        image + reinterpret_cast<const IMAGE_DOS_HEADER*>(image)->e_lfanew);
+    const BYTE* imageEnd = image + headers->OptionalHeader.SizeOfImage;
+    size_t count = 0;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPTHREAD, 0));
+    THREADENTRY32 entry = {sizeof entry};
+    for (BOOL more = Thread32First(snapshot.Get(), &entry); more; more = Thread32Next(snapshot.Get(), &entry)) {
+        if (entry.th32OwnerProcessID != GetCurrentProcessId()) continue;
+        UniqueHandle thread(OpenThread(THREAD_QUERY_INFORMATION, FALSE, entry.th32ThreadID));
+        const BYTE* start = nullptr;
+        const int kThreadQuerySetWin32StartAddress = 9;
+        if (thread && query(thread.Get(), kThreadQuerySetWin32StartAddress, &start, sizeof start, nullptr) == 0 &&
+            start >= image && start < imageEnd)
+            ++count;
+    }
+    return count;
+}
+
+// Open handles of this process, found by probing (Wine's GetProcessHandleCount gives 0).
+DWORD HandleCount() {
+    DWORD count = 0, flags = 0;
+    for (UINT_PTR value = 4; value < 0x20000; value += 4)
+        if (GetHandleInformation(reinterpret_cast<HANDLE>(value), &flags)) ++count;
+    return count;
+}
+
+std::vector<DWORD> SimulatorProcesses() {
+    std::vector<DWORD> ids;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
+    PROCESSENTRY32W entry = {sizeof entry};
+    for (BOOL more = Process32FirstW(snapshot.Get(), &entry); more; more = Process32NextW(snapshot.Get(), &entry))
+        if (_wcsicmp(entry.szExeFile, L"CalvexDeviceSim.exe") == 0) ids.push_back(entry.th32ProcessID);
+    return ids;
+}
+
+// Runs the simulator with one switch (/RegServer, /UnregServer) and waits for it.
+DWORD RunSimulator(const wchar_t* option) {
+    std::wstring command = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" " + option;
+    STARTUPINFOW startup = {sizeof startup};
+    PROCESS_INFORMATION process = {};
+    if (!CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
+        return GetLastError();
+    UniqueHandle processHandle(process.hProcess), threadHandle(process.hThread);
+    WaitForSingleObject(process.hProcess, 60000);
+    DWORD exitCode = 1;
+    GetExitCodeProcess(process.hProcess, &exitCode);
+    return exitCode;
+}
+
+// The built DLL, loaded as Explorer loads it.
+class LoadedModule {
+public:
+    LoadedModule() : m_module(LoadLibraryW(ModuleDllPath().c_str())) {
+        getClassObject = reinterpret_cast<GetClassObjectFn>(GetProcAddress(m_module.Get(), "DllGetClassObject"));
+        canUnloadNow = reinterpret_cast<CanUnloadNowFn>(GetProcAddress(m_module.Get(), "DllCanUnloadNow"));
+    }
+    HMODULE Handle() const { return m_module.Get(); }
+    ComPtr<IShellFolder> NewRootFolder(const CLSID& clsid) {
+        ComPtr<IClassFactory> factory;
+        ComPtr<IShellFolder> folder;
+        if (FAILED(getClassObject(clsid, IID_IClassFactory, factory.PutVoid()))) return folder;
+        if (FAILED(factory->CreateInstance(nullptr, IID_IShellFolder, folder.PutVoid()))) return folder;
+        ComPtr<IPersistFolder> persist;
+        folder.QueryTo(IID_IPersistFolder, persist.PutVoid());
+        if (persist) persist->Initialize(nullptr);
+        return folder;
+    }
+    GetClassObjectFn getClassObject = nullptr;
+    CanUnloadNowFn canUnloadNow = nullptr;
+
+private:
+    UniqueLibrary m_module;
+};
+
+struct Listing {
+    HRESULT result;
+    std::vector<LPITEMIDLIST> items;
+    ~Listing() {
+        for (LPITEMIDLIST item : items) CoTaskMemFree(item);
+    }
+};
+
+void List(IShellFolder* folder, SHCONTF flags, Listing& listing) {
+    ComPtr<IEnumIDList> enumerator;
+    listing.result = folder->EnumObjects(nullptr, flags, &enumerator);
+    LPITEMIDLIST item = nullptr;
+    while (enumerator && enumerator->Next(1, &item, nullptr) == S_OK) listing.items.push_back(item);
+}
+
+// One folder bound and released; listed and walked into a receiver, as a user opening a
+// receiver does, when asked.
+void BindAndRelease(LoadedModule& module, const CLSID& clsid, bool intoReceiver) {
+    ComPtr<IShellFolder> root = module.NewRootFolder(clsid);
+    ASSERT_TRUE(root);
+    Listing receivers;
+    List(root.Get(), intoReceiver ? SHCONTF_FOLDERS : 0, receivers);  // no flags: bound, nothing read
+    ASSERT_EQ(S_OK, receivers.result);
+    if (!intoReceiver || receivers.items.empty()) return;
+    ComPtr<IShellFolder> receiver;
+    ASSERT_EQ(S_OK, root->BindToObject(receivers.items[0], nullptr, IID_IShellFolder, receiver.PutVoid()));
+    Listing files;
+    List(receiver.Get(), SHCONTF_NONFOLDERS, files);
+}
+}  // namespace
+
+TEST(ShellFolderLifetime, ThousandBoundFoldersLeaveNothingBehind) {
+    DeviceSimScope scope;  // the sample tree
+    LoadedModule module;
+    ASSERT_TRUE(module.getClassObject && module.canUnloadNow);
+    // Warm up: the type library, COM's own threads and the server.
+    for (int i = 0; i < 5; ++i) BindAndRelease(module, CLSID_CalvexReceiversShellFolder, true);
+    {
+        ComPtr<IShellFolder> alive = module.NewRootFolder(CLSID_BrennorReceiversShellFolder);
+        ASSERT_EQ(1u, ThreadsStartedIn(module.Handle())) << "a live folder has its thread";
+    }
+    PumpMessagesFor(500);
+    const size_t threads = ThreadCount();
+    const DWORD handles = HandleCount();
+    ASSERT_GT(handles, 0u);
+
+    for (int i = 0; i < 1000; ++i) {
+        BindAndRelease(module, i % 2 ? CLSID_BrennorReceiversShellFolder : CLSID_CalvexReceiversShellFolder, i % 50 == 0);
+        if (i % 50 == 0) PumpMessagesFor(10);
+    }
+    EXPECT_EQ(0u, ThreadsStartedIn(module.Handle())) << "every folder's notification thread has ended";
+    EXPECT_EQ(S_OK, module.canUnloadNow()) << "no object or lock is left";
+    // COM may keep a worker thread of its own a little longer.
+    EXPECT_TRUE(PumpUntil([&] { return ThreadCount() <= threads; }, 10000)) << ThreadCount() << " > " << threads;
+    EXPECT_LE(HandleCount(), handles + 8) << "timers, events and threads are closed";
+}
+
+TEST(ShellFolderLifetime, KilledDeviceManagerMakesFoldersFailOrListNothing) {
+    DeviceSimScope scope;
+    LoadedModule module;
+    ComPtr<IShellFolder> root = module.NewRootFolder(CLSID_CalvexReceiversShellFolder);
+    ASSERT_TRUE(root);
+    Listing receivers;
+    List(root.Get(), SHCONTF_FOLDERS, receivers);
+    ASSERT_FALSE(receivers.items.empty());
+    ComPtr<IShellFolder> receiver;
+    ASSERT_EQ(S_OK, root->BindToObject(receivers.items[0], nullptr, IID_IShellFolder, receiver.PutVoid()));
+
+    std::vector<DWORD> servers = SimulatorProcesses();
+    ASSERT_FALSE(servers.empty());
+    for (DWORD id : servers) {
+        UniqueHandle process(OpenProcess(PROCESS_TERMINATE | SYNCHRONIZE, FALSE, id));
+        TerminateProcess(process.Get(), 3);
+        WaitForSingleObject(process.Get(), 10000);
+    }
+
+    const ULONGLONG start = GetTickCount64();
+    Listing afterRoot, afterFiles;
+    List(root.Get(), SHCONTF_FOLDERS, afterRoot);
+    List(receiver.Get(), SHCONTF_NONFOLDERS, afterFiles);
+    EXPECT_TRUE(FAILED(afterRoot.result) || afterRoot.items.empty());
+    EXPECT_TRUE(FAILED(afterFiles.result) || afterFiles.items.empty());
+    ComPtr<IShellFolder> again;
+    const HRESULT bind = root->BindToObject(receivers.items[0], nullptr, IID_IShellFolder, again.PutVoid());
+    EXPECT_TRUE(FAILED(bind)) << "the receiver cannot be found any more";
+    receiver.Reset();
+    root.Reset();
+    EXPECT_LT(GetTickCount64() - start, 60000u) << "no call waited for the dead server";
+    EXPECT_EQ(S_OK, module.canUnloadNow());
+}
+
+TEST(ShellFolderLifetime, UnregisteredDeviceManagerGivesAnEmptyFolderAndOnlySuccesses) {
+    DeviceSimScope scope;
+    struct Reregister {
+        ~Reregister() { EXPECT_EQ(0u, RunSimulator(L"/RegServer")); }
+    } reregister;
+    ASSERT_EQ(0u, RunSimulator(L"/UnregServer"));
+    {
+        LoadedModule module;
+        const CLSID* classes[] = {&CLSID_CalvexReceiversShellFolder, &CLSID_BrennorReceiversShellFolder};
+        for (const CLSID* clsid : classes) {
+            ComPtr<IShellFolder> root = module.NewRootFolder(*clsid);
+            ASSERT_TRUE(root);
+            Listing receivers;
+            List(root.Get(), SHCONTF_FOLDERS | SHCONTF_NONFOLDERS, receivers);
+            EXPECT_EQ(S_OK, receivers.result);
+            EXPECT_TRUE(receivers.items.empty());
+            ComPtr<IContextMenu> menu;
+            EXPECT_EQ(S_OK, root->CreateViewObject(nullptr, IID_IContextMenu, menu.PutVoid()));
+            // A receiver the shell remembers: its folder binds to nothing and lists nothing.
+            LPITEMIDLIST remembered = nullptr;
+            std::wstring key = L"5302-00871!Q9 GNSS!USB";
+            ASSERT_EQ(S_OK, root->ParseDisplayName(nullptr, nullptr, &key[0], nullptr, &remembered, nullptr));
+            ComPtr<IShellFolder> receiver;
+            EXPECT_EQ(S_OK, root->BindToObject(remembered, nullptr, IID_IShellFolder, receiver.PutVoid()));
+            CoTaskMemFree(remembered);
+            ASSERT_TRUE(receiver);
+            Listing files;
+            List(receiver.Get(), SHCONTF_NONFOLDERS, files);
+            EXPECT_EQ(S_OK, files.result);
+            EXPECT_TRUE(files.items.empty());
+        }
+    }
+}
