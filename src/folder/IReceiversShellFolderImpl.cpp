@@ -182,7 +182,8 @@ STDMETHODIMP IReceiversShellFolderImpl::ParseDisplayName(HWND, IBindCtx*, LPWSTR
     *ppidl = m_pidlMgr->CopyFrom(list.Get(), nItems - nParts);
     TraceW(L"IReceiversShellFolderImpl::ParseDisplayName - item [%s] pidl [0x%p] created \r\n", pszDisplayName,
            *ppidl);
-    return *ppidl ? S_OK : E_OUTOFMEMORY;
+    // A name without parts names nothing below this folder: success and no list, as always.
+    return *ppidl || nParts == 0 ? S_OK : E_OUTOFMEMORY;
 }
 
 STDMETHODIMP IReceiversShellFolderImpl::EnumObjects(HWND, SHCONTF grfFlags, IEnumIDList** ppenumIDList) {
@@ -275,8 +276,7 @@ STDMETHODIMP IReceiversShellFolderImpl::CreateViewObject(HWND hwndOwner, REFIID 
         return E_NOINTERFACE;
     }
     if (IsEqualIID(riid, IID_IContextMenu)) {
-        HRESULT hr = InitCollections();
-        if (FAILED(hr)) return hr;
+        InitCollections();  // the menu needs nothing of it
         return CreateComInstance<CCalvexReceiversContextMenu>(nullptr, riid, ppv);
     }
     return E_NOINTERFACE;

@@ -133,6 +133,7 @@ TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
         {brennor.Get(), kKey, S_OK, 1, 4, kKey},
         {receiver.Get(), L"FILE.qpr", S_OK, 1, 6, L"FILE.qpr"},
         {root.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},  // the file part b\c is one item
+        {root.Get(), L"\\", S_OK, 0, 0, nullptr},  // no part: success without a list
         {receiver.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},
     };
     for (const auto& c : cases) {
