@@ -13,6 +13,9 @@
 #include <vector>
 
 #include "com/ComPtr.h"
+#include "folder/CBrennorReceiversShellFolder.h"
+#include "folder/CCalvexReceiversShellFolder.h"
+#include "module/ClassIds.h"
 #include "support/TestSupport.h"
 
 namespace {
@@ -156,4 +159,27 @@ TEST(ShellNamespace, ExplorerBrowserReachesTheFolderAndAsksForItsView) {
     browser->Destroy();
     browser.Reset();
     DestroyWindow(host);
+}
+
+// A receiver sub-folder is made by its parent's class: a Brennor root hands out Brennor
+// receiver folders, which still report the Calvex class.
+TEST(ShellNamespace, ReceiverFoldersKeepTheirParentsBrand) {
+    ComObject<CBrennorReceiversShellFolder>* root = nullptr;
+    ASSERT_EQ(S_OK, CreateComObject<CBrennorReceiversShellFolder>(&root));
+    ComPtr<IShellFolder> rootFolder(static_cast<IShellFolder2*>(root));
+    root->Release();
+    ASSERT_EQ(S_OK, root->Initialize(nullptr));
+    std::vector<LPITEMIDLIST> children;
+    List(rootFolder.Get(), SHCONTF_FOLDERS, &children);
+    ASSERT_FALSE(children.empty());
+    ComPtr<IShellFolder2> receiver;
+    ASSERT_EQ(S_OK, rootFolder->BindToObject(children[0], nullptr, IID_IShellFolder2, receiver.PutVoid()));
+    auto* impl = static_cast<IReceiversShellFolderImpl*>(receiver.Get());
+    EXPECT_NE(nullptr, dynamic_cast<CBrennorReceiversShellFolder*>(impl));
+    EXPECT_EQ(2u, impl->BrandKind());
+    EXPECT_TRUE(impl->EventSourceCollection()) << "bound to the receiver's files";
+    CLSID clsid = GUID_NULL;
+    EXPECT_EQ(S_OK, impl->GetClassID(&clsid));
+    EXPECT_TRUE(IsEqualCLSID(CLSID_CalvexReceiversShellFolder, clsid));
+    for (LPITEMIDLIST child : children) CoTaskMemFree(child);
 }
