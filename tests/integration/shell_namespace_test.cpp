@@ -137,9 +137,20 @@ TEST(ShellNamespace, BrandsListOnlyTheirOwnReceivers) {
 }
 
 // Wine's ExplorerBrowser asks the folder for its view; until the folder has a view of its
-// own it gets E_NOINTERFACE and cannot show the folder. What holds now: the browser reaches
-// our folder, asks it for a view and fails cleanly, without hanging or crashing.
-TEST(ShellNamespace, ExplorerBrowserReachesTheFolderAndAsksForItsView) {
+// own it gets E_NOINTERFACE and cannot show the folder. What holds now: the browser walks
+// into the receiver (our folder is made for it), asks it for a view and fails cleanly,
+// without hanging or crashing. Once the view exists, this test must see S_OK instead.
+TEST(ShellNamespace, ExplorerBrowserWalksIntoAReceiverAndAsksForItsView) {
+    const std::wstring root = std::wstring(kComputer) + L"\\" + kCalvex;
+    LPITEMIDLIST rootPidl = ParseFromDesktop(root);
+    ASSERT_NE(nullptr, rootPidl);
+    std::vector<Listed> receivers = List(BindFromDesktop(rootPidl).Get(), SHCONTF_FOLDERS);
+    CoTaskMemFree(rootPidl);
+    ASSERT_FALSE(receivers.empty());
+    const std::wstring receiverPath = root + L"\\" + receivers[0].inFolder;
+    LPITEMIDLIST receiverPidl = ParseFromDesktop(receiverPath);
+    ASSERT_NE(nullptr, receiverPidl);
+
     HWND host = CreateWindowExW(0, L"STATIC", L"host", WS_OVERLAPPEDWINDOW, 0, 0, 640, 480, nullptr, nullptr, nullptr, nullptr);
     ASSERT_NE(nullptr, host);
     ComPtr<IExplorerBrowser> browser;
@@ -148,14 +159,15 @@ TEST(ShellNamespace, ExplorerBrowserReachesTheFolderAndAsksForItsView) {
     RECT bounds = {0, 0, 640, 480};
     FOLDERSETTINGS settings = {FVM_DETAILS, 0};
     ASSERT_EQ(S_OK, browser->Initialize(host, &bounds, &settings));
-
-    LPITEMIDLIST rootPidl = ParseFromDesktop(std::wstring(kComputer) + L"\\" + kCalvex);
-    ASSERT_NE(nullptr, rootPidl);
-    const HRESULT hr = browser->BrowseToIDList(rootPidl, SBSP_ABSOLUTE);
+    const size_t from = testsupport::ReadTraceLog().size();
+    const HRESULT hr = browser->BrowseToIDList(receiverPidl, SBSP_ABSOLUTE);
     testsupport::PumpMessagesFor(500);
     EXPECT_TRUE(FAILED(hr)) << "no view yet";
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CreateViewObject from 0x"));
-    CoTaskMemFree(rootPidl);
+    const std::string trace = testsupport::ReadTraceLog().substr(from);
+    EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::Init " + testsupport::Narrow(receiverPath) + "\r\n"))
+        << "the browser bound the receiver folder";
+    EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::CreateViewObject from 0x"));
+    CoTaskMemFree(receiverPidl);
     browser->Destroy();
     browser.Reset();
     DestroyWindow(host);
