@@ -33,6 +33,14 @@ struct ItemList {
     ~ItemList() { CoTaskMemFree(p); }
 };
 
+// UTF-8 whatever the console's code page, so that names survive a pipe.
+void Print(const std::wstring& text) {
+    int n = WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), nullptr, 0, nullptr, nullptr);
+    std::string bytes(static_cast<size_t>(n), '\0');
+    WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), &bytes[0], n, nullptr, nullptr);
+    fwrite(bytes.data(), 1, bytes.size(), stdout);
+}
+
 std::wstring Name(IShellFolder* folder, PCUITEMID_CHILD item, SHGDNF flags) {
     STRRET name = {};
     wchar_t* text = nullptr;
@@ -77,8 +85,8 @@ HRESULT List(IShellFolder* folder, int depth, bool recurse) {
         folder->GetAttributesOf(1, &child, &attributes);
         const bool isFolder = (attributes & SFGAO_FOLDER) != 0;
         std::wstring tip = InfoTip(folder, item);
-        wprintf(L"%*s%ls %ls%ls%ls\n", depth * 2, L"", isFolder ? L"[+]" : L" - ", Name(folder, item, SHGDN_NORMAL).c_str(),
-                tip.empty() ? L"" : L"    ", tip.c_str());
+        Print(std::wstring(depth * 2, L' ') + (isFolder ? L"[+] " : L" -  ") + Name(folder, item, SHGDN_NORMAL) +
+              (tip.empty() ? L"" : L"    " + tip) + L"\n");
         if (recurse && isFolder) {
             Ref<IShellFolder> sub;
             if (SUCCEEDED(folder->BindToObject(item, nullptr, IID_IShellFolder, sub.out())))
@@ -98,7 +106,7 @@ int Run(const std::wstring& command, const std::wstring& path) {
             std::wstring target = paths ? paths[i] : single;
             Ref<IShellFolder> folder;
             HRESULT hr = Bind(target, reinterpret_cast<IShellFolder**>(&folder.p));
-            wprintf(L"%ls\n", target.c_str());
+            Print(target + L"\n");
             if (SUCCEEDED(hr)) hr = List(folder.p, 1, tree);
             if (FAILED(hr)) {
                 fwprintf(stderr, L"calvex-shell: %ls: error 0x%08lX\n", target.c_str(), static_cast<unsigned long>(hr));
