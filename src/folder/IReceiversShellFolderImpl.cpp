@@ -55,6 +55,8 @@ IReceiversShellFolderImpl::IReceiversShellFolderImpl(DWORD brandKind) : m_brandK
     if (m_updateTimer && m_stopEvent) m_thread.Reset(CreateThread(nullptr, 0, ThreadProc, this, 0, nullptr));
 }
 
+// Released in the folder's long-standing order: the thread is told to stop first and only
+// waited for once everything it cannot touch is gone; the device manager objects go last.
 IReceiversShellFolderImpl::~IReceiversShellFolderImpl() {
     if (m_updateTimer) CancelWaitableTimer(m_updateTimer.Get());
     if (m_stopEvent) SetEvent(m_stopEvent.Get());
