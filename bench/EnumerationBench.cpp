@@ -1,6 +1,6 @@
 // calvex_enum_bench [files...]: lists the files of one receiver of the simulated device
 // manager (out of process) through CCalvexReceiversEnumIDList, for each count given
-// (default 1000 10000), and sets the time per item and the calls per item against a null
+// (default 1000 10000), and reports the time per item and the calls per item against a null
 // call (get_Count) and a raw walk of the same files, all measured in the same run.
 #include <windows.h>
 #include <objbase.h>
@@ -12,6 +12,7 @@
 
 #include "CalvexDeviceMgrLib.h"
 #include "CountingFiles.h"
+#include "SimServerProcess.h"
 #include "com/Bstr.h"
 #include "com/ComObject.h"
 #include "com/Handles.h"
@@ -19,7 +20,6 @@
 #include "module/ModuleApp.h"
 
 namespace {
-const wchar_t kSimKey[] = L"Software\\Calvex\\DeviceSim";
 const wchar_t kReceiverFolder[] = L"Bench Q7 COM3";
 const wchar_t kReceiverPath[] = L"Calvex Receivers\\5211-40125!Q7#RTK!COM3";
 const char kDescription[] =
@@ -79,32 +79,6 @@ public:
 private:
     std::wstring m_root, m_folder;
     bool m_ok = false;
-};
-
-// Points the simulator at a tree for the objects made from now on; puts the old value back.
-class SimRootSetting {
-public:
-    SimRootSetting() {
-        RegCreateKeyExW(HKEY_CURRENT_USER, kSimKey, 0, nullptr, 0, KEY_READ | KEY_WRITE, nullptr, m_key.Put(), nullptr);
-        wchar_t old[MAX_PATH * 2];
-        DWORD bytes = sizeof old;
-        m_hadOld = RegQueryValueExW(m_key.Get(), L"Root", nullptr, nullptr, reinterpret_cast<BYTE*>(old), &bytes) ==
-                   ERROR_SUCCESS;
-        if (m_hadOld) m_old = old;
-    }
-    ~SimRootSetting() {
-        if (m_hadOld) Set(m_old);
-        else RegDeleteValueW(m_key.Get(), L"Root");
-    }
-    void Set(const std::wstring& root) {
-        RegSetValueExW(m_key.Get(), L"Root", 0, REG_SZ, reinterpret_cast<const BYTE*>(root.c_str()),
-                       static_cast<DWORD>((root.size() + 1) * sizeof(wchar_t)));
-    }
-
-private:
-    UniqueRegKey m_key;
-    std::wstring m_old;
-    bool m_hadOld = false;
 };
 
 // The files collection of the only receiver of a new device manager object.
@@ -176,10 +150,11 @@ EnumResult EnumerateThroughExtension(IFilesColl* files) {
     return result;
 }
 
-int RunOne(SimRootSetting& setting, int fileCount) {
+int RunOne(int fileCount) {
     BenchTree tree(fileCount);
     if (!tree.Ok()) return fprintf(stderr, "cannot write the tree for %d files\n", fileCount), 1;
-    setting.Set(tree.Root());
+    SimServerProcess server(tree.Root());
+    if (!server.Ready()) return fprintf(stderr, "the simulator did not start\n"), 1;
     ComPtr<IDeviceMgr> manager;
     ComPtr<IFilesColl> files;
     HRESULT hr = OpenFiles(manager, files);
@@ -215,10 +190,7 @@ int main(int argc, char** argv) {
     if (FAILED(CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED))) return 2;
     CModuleApp::Instance().EnsureInitialized();  // the trace is on, as in Explorer
     int failures = 0;
-    {
-        SimRootSetting setting;
-        for (int count : counts) failures += RunOne(setting, count);
-    }
+    for (int count : counts) failures += RunOne(count);
     CoUninitialize();
     return failures;
 }
