@@ -5,6 +5,7 @@
 #include <commctrl.h>
 #include <objbase.h>
 
+#include <cstdio>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -18,7 +19,19 @@ static void UsePrivateTempDirectory() {
     SetEnvironmentVariableW(L"TEMP", dir.c_str());
 }
 
+// A fault in a test program is reported and ends it at once, instead of waiting for a
+// debugger or a crash dialog until the test's time runs out.
+static LONG WINAPI ReportFault(EXCEPTION_POINTERS* info) {
+    fprintf(stderr, "FATAL: exception 0x%08lX at %p\n", info->ExceptionRecord->ExceptionCode,
+            info->ExceptionRecord->ExceptionAddress);
+    fflush(stderr);
+    TerminateProcess(GetCurrentProcess(), 3);
+    return EXCEPTION_EXECUTE_HANDLER;
+}
+
 int main(int argc, char** argv) {
+    SetUnhandledExceptionFilter(ReportFault);
+    SetErrorMode(SEM_FAILCRITICALERRORS | SEM_NOGPFAULTERRORBOX);
     ::testing::InitGoogleTest(&argc, argv);
     UsePrivateTempDirectory();
     CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED);
