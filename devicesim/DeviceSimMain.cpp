@@ -1,5 +1,6 @@
 // CalvexDeviceSim.exe: the simulated device manager as a COM local server.
-//   /RegServer, /UnregServer   write or remove its registration, then exit
+//   /RegServer, /UnregServer   write or remove its registration (running servers quit first)
+//   /Quit                      make every running server quit, then exit
 //   -Embedding                 started by COM
 //   /Root <folder>             serve that tree instead of the configured one
 #include <windows.h>
@@ -17,6 +18,7 @@ namespace {
 struct Options {
     bool registerServer = false;
     bool unregisterServer = false;
+    bool quit = false;
     std::wstring root;
 };
 
@@ -33,6 +35,8 @@ Options ParseOptions() {
             options.registerServer = true;
         else if (Is(args[i], L"UnregServer"))
             options.unregisterServer = true;
+        else if (Is(args[i], L"Quit"))
+            options.quit = true;
         else if (Is(args[i], L"Root") && i + 1 < count)
             options.root = args[++i];
     }
@@ -46,13 +50,17 @@ int WINAPI wWinMain(HINSTANCE, HINSTANCE, PWSTR, int) {
     const Options options = ParseOptions();
     if (FAILED(CoInitializeEx(nullptr, COINIT_APARTMENTTHREADED))) return 1;
     int exitCode = 0;
+    if (options.quit || options.registerServer || options.unregisterServer) {
+        // A server left running would go on serving the build it was started from.
+        SimServer::StopRunningServers();
+    }
     if (options.registerServer || options.unregisterServer) {
         HRESULT hr = options.registerServer ? SimRegistration::Register(SimServer::ExePath())
                                             : SimRegistration::Unregister();
         SimLog::Write(std::wstring(options.registerServer ? L"/RegServer" : L"/UnregServer") +
                       (SUCCEEDED(hr) ? L" done" : L" failed"));
         exitCode = SUCCEEDED(hr) ? 0 : 1;
-    } else {
+    } else if (!options.quit) {
         exitCode = SimServer(options.root).Run();
     }
     CoUninitialize();

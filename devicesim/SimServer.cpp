@@ -1,6 +1,9 @@
 #include "SimServer.h"
 
+#include <tlhelp32.h>
+
 #include <utility>
+#include <vector>
 
 #include "CalvexDeviceMgrLib.h"
 #include "DeviceSimConfig.h"
@@ -16,6 +19,7 @@ namespace {
 
 const UINT kIdleCheckPeriod = 250;
 const ULONGLONG kIdleExitAfter = 2000;
+const DWORD kQuitWait = 10000;
 
 std::wstring BackSlashes(std::wstring path) {
     for (wchar_t& c : path)
@@ -42,6 +46,32 @@ std::wstring SimServer::Root() const {
     if (!m_rootOverride.empty()) return BackSlashes(m_rootOverride);
     std::wstring root = SimSettings::RegistryRoot();
     return root.empty() ? DefaultRoot() : BackSlashes(root);
+}
+
+int SimServer::StopRunningServers() {
+    const std::wstring self = ExePath();
+    const wchar_t* exeName = wcsrchr(self.c_str(), L'\\') ? wcsrchr(self.c_str(), L'\\') + 1 : self.c_str();
+    std::vector<UniqueHandle> servers;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
+    PROCESSENTRY32W entry = {sizeof entry};
+    for (BOOL more = snapshot && Process32FirstW(snapshot.Get(), &entry); more;
+         more = Process32NextW(snapshot.Get(), &entry)) {
+        if (entry.th32ProcessID == GetCurrentProcessId() ||
+            CompareStringOrdinal(entry.szExeFile, -1, exeName, -1, TRUE) != CSTR_EQUAL)
+            continue;
+        UniqueHandle process(OpenProcess(PROCESS_TERMINATE | SYNCHRONIZE, FALSE, entry.th32ProcessID));
+        if (process) servers.push_back(std::move(process));
+    }
+    UniqueHandle quit(CreateEventW(nullptr, TRUE, FALSE, kQuitEventName));
+    if (quit) SetEvent(quit.Get());
+    for (const UniqueHandle& process : servers) {
+        if (WaitForSingleObject(process.Get(), kQuitWait) == WAIT_OBJECT_0) continue;
+        SimLog::Write(L"a server did not quit: killed");
+        TerminateProcess(process.Get(), 1);
+        WaitForSingleObject(process.Get(), kQuitWait);
+    }
+    if (quit) ResetEvent(quit.Get());
+    return static_cast<int>(servers.size());
 }
 
 int SimServer::Run() {

@@ -11,6 +11,10 @@ public:
     // Set by whoever wants the running server gone (tests that point it elsewhere).
     static const wchar_t kQuitEventName[];
 
+    // Asks every other running server to quit, waits for them (killing those that do not
+    // answer) and returns how many there were.
+    static int StopRunningServers();
+
     // rootOverride: the folder of "/Root <folder>", or empty.
     explicit SimServer(std::wstring rootOverride);
     int Run();

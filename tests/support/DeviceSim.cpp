@@ -1,7 +1,5 @@
 #include "support/DeviceSim.h"
 
-#include <tlhelp32.h>
-
 #include "com/Handles.h"
 
 namespace testsupport {
@@ -26,12 +24,6 @@ std::string PatternBytes(size_t size, const std::wstring& seed) {
         b = static_cast<char>(state >> 16);
     }
     return bytes;
-}
-
-bool IsSimulator(const wchar_t* exeName) {
-    const wchar_t* base = wcsrchr(exeName, L'\\');
-    base = base ? base + 1 : exeName;
-    return CompareStringOrdinal(base, -1, L"CalvexDeviceSim.exe", -1, TRUE) == CSTR_EQUAL;
 }
 
 }  // namespace
@@ -94,25 +86,13 @@ std::string ReadFileBytes(const std::wstring& path) {
 bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
 void StopDeviceSimServers() {
-    std::vector<UniqueHandle> servers;
-    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
-    PROCESSENTRY32W entry = {sizeof entry};
-    for (BOOL more = snapshot && Process32FirstW(snapshot.Get(), &entry); more;
-         more = Process32NextW(snapshot.Get(), &entry)) {
-        if (!IsSimulator(entry.szExeFile)) continue;
-        UniqueHandle process(OpenProcess(PROCESS_TERMINATE | SYNCHRONIZE, FALSE, entry.th32ProcessID));
-        if (process) servers.push_back(std::move(process));
-    }
-    // The server's event; a killed server would leave its class registered with Wine's rpcss.
-    UniqueHandle quit(OpenEventW(EVENT_MODIFY_STATE, FALSE, L"CalvexDeviceSim.Quit"));
-    if (quit) SetEvent(quit.Get());
-    for (const UniqueHandle& process : servers) {
-        // Pumped: the quitting server releases its proxies of this thread's sinks.
-        if (PumpUntil([&] { return WaitForSingleObject(process.Get(), 0) == WAIT_OBJECT_0; }, 10000)) continue;
-        TerminateProcess(process.Get(), 1);
-        WaitForSingleObject(process.Get(), 10000);
-    }
-    if (quit) ResetEvent(quit.Get());
+    std::wstring command = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" /Quit";
+    STARTUPINFOW startup = {sizeof startup};
+    PROCESS_INFORMATION info = {};
+    if (!CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &info)) return;
+    UniqueHandle process(info.hProcess), thread(info.hThread);
+    // Pumped: a quitting server releases its proxies of this thread's sinks.
+    PumpUntil([&] { return WaitForSingleObject(process.Get(), 0) == WAIT_OBJECT_0; }, 30000);
 }
 
 void UseDeviceSimRoot(const std::wstring& root) {
@@ -142,6 +122,116 @@ DeviceSimScope::DeviceSimScope(const std::wstring& root) {
 }
 
 DeviceSimScope::~DeviceSimScope() { RestoreDeviceSimDefaults(); }
+
+namespace {
+
+template <class T>
+ComPtr<T> Query(IDispatch* object, REFIID iid) {
+    ComPtr<T> out;
+    if (object) object->QueryInterface(iid, out.PutVoid());
+    return out;
+}
+
+template <class T>
+ComPtr<T> Kept(HRESULT hr, HRESULT* result, const ComPtr<IDispatch>& object, REFIID iid) {
+    if (result) *result = hr;
+    return Query<T>(object.Get(), iid);
+}
+
+}  // namespace
+
+ComPtr<IDeviceMgr> CreateDeviceManager(HRESULT* result) {
+    ComPtr<IDeviceMgr> manager;
+    HRESULT hr = CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, manager.PutVoid());
+    if (result) *result = hr;
+    return manager;
+}
+
+ComPtr<IReceiversColl> ReceiversOf(IDeviceMgr* manager) {
+    ComPtr<IDispatch> object;
+    if (!manager) return nullptr;
+    HRESULT hr = manager->get_Receivers(&object);
+    return Kept<IReceiversColl>(hr, nullptr, object, IID_IReceiversColl);
+}
+
+ComPtr<IReceiver> ReceiverAt(IReceiversColl* receivers, LONG index, HRESULT* result) {
+    ComPtr<IDispatch> object;
+    HRESULT hr = receivers->get_Item(index, &object);
+    return Kept<IReceiver>(hr, result, object, IID_IReceiver);
+}
+
+ComPtr<IReceiver> ReceiverByKey(IReceiversColl* receivers, const std::wstring& key, HRESULT* result) {
+    ComPtr<IDispatch> object;
+    BSTR text = SysAllocStringLen(key.data(), static_cast<UINT>(key.size()));
+    HRESULT hr = receivers->get_ItemByKey(text, &object);
+    SysFreeString(text);
+    return Kept<IReceiver>(hr, result, object, IID_IReceiver);
+}
+
+ComPtr<IFilesColl> FilesOf(IReceiver* receiver) {
+    ComPtr<IDispatch> object;
+    if (!receiver) return nullptr;
+    HRESULT hr = receiver->get_Files(&object);
+    return Kept<IFilesColl>(hr, nullptr, object, IID_IFilesColl);
+}
+
+ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result) {
+    ComPtr<IDispatch> object;
+    HRESULT hr = files->get_Item(index, &object);
+    return Kept<IReceiverFile>(hr, result, object, IID_IReceiverFile);
+}
+
+ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result) {
+    ComPtr<IDispatch> object;
+    BSTR text = SysAllocStringLen(name.data(), static_cast<UINT>(name.size()));
+    HRESULT hr = files->get_ItemByName(text, &object);
+    SysFreeString(text);
+    return Kept<IReceiverFile>(hr, result, object, IID_IReceiverFile);
+}
+
+std::wstring FileName(IReceiverFile* file) {
+    BSTR text = nullptr;
+    if (!file || FAILED(file->get_Name(&text))) return std::wstring();
+    std::wstring name(text ? text : L"", text ? SysStringLen(text) : 0);
+    SysFreeString(text);
+    return name;
+}
+
+ComPtr<IStream> NewMemoryStream() {
+    ComPtr<IStream> stream;
+    CreateStreamOnHGlobal(nullptr, TRUE, &stream);
+    return stream;
+}
+
+HRESULT StartDownload(IReceiverFile* file, IStream* stream) {
+    VARIANT destination;
+    VariantInit(&destination);
+    destination.vt = VT_UNKNOWN;
+    destination.punkVal = stream;  // borrowed: Download takes its own reference
+    return file->Download(destination);
+}
+
+std::string StreamBytes(IStream* stream) {
+    HGLOBAL block = nullptr;
+    STATSTG stat = {};
+    if (FAILED(GetHGlobalFromStream(stream, &block)) || FAILED(stream->Stat(&stat, STATFLAG_NONAME)))
+        return std::string();
+    GlobalLockGuard<const char> data(block);
+    return data ? std::string(data.Get(), static_cast<size_t>(stat.cbSize.QuadPart)) : std::string();
+}
+
+ULONGLONG StreamPosition(IStream* stream) {
+    LARGE_INTEGER zero = {};
+    ULARGE_INTEGER position = {};
+    stream->Seek(zero, STREAM_SEEK_CUR, &position);
+    return position.QuadPart;
+}
+
+bool IsServerGone(HRESULT hr) {
+    return hr == RPC_E_SERVERFAULT || hr == HRESULT_FROM_WIN32(RPC_S_SERVER_UNAVAILABLE) ||
+           hr == HRESULT_FROM_WIN32(RPC_S_CALL_FAILED) || hr == CO_E_OBJNOTCONNECTED || hr == RPC_E_DISCONNECTED ||
+           hr == RPC_E_SERVER_DIED || hr == RPC_E_SERVER_DIED_DNE;
+}
 
 SimEventRecorder::~SimEventRecorder() {
     Unadvise();

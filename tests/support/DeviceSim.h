@@ -56,8 +56,8 @@ private:
 std::string ReadFileBytes(const std::wstring& path);
 bool FileExists(const std::wstring& path);
 
-// Asks every running CalvexDeviceSim.exe of the prefix to quit (killed if it does not) and
-// waits until they are gone; this thread's messages are pumped meanwhile.
+// Makes every running CalvexDeviceSim.exe of the prefix quit ("CalvexDeviceSim.exe /Quit")
+// and waits until they are gone; this thread's messages are pumped meanwhile.
 void StopDeviceSimServers();
 // Points the out-of-process simulator at root; the next client starts a fresh server.
 void UseDeviceSimRoot(const std::wstring& root);
@@ -75,6 +75,25 @@ public:
     DeviceSimScope(const DeviceSimScope&) = delete;
     DeviceSimScope& operator=(const DeviceSimScope&) = delete;
 };
+
+// Walking the contract through the interfaces' slots, as the extension does; a failed step
+// gives a null pointer (and its result where asked for).
+ComPtr<IDeviceMgr> CreateDeviceManager(HRESULT* result = nullptr);  // the local server
+ComPtr<IReceiversColl> ReceiversOf(IDeviceMgr* manager);
+ComPtr<IReceiver> ReceiverAt(IReceiversColl* receivers, LONG index, HRESULT* result = nullptr);
+ComPtr<IReceiver> ReceiverByKey(IReceiversColl* receivers, const std::wstring& key, HRESULT* result = nullptr);
+ComPtr<IFilesColl> FilesOf(IReceiver* receiver);
+ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result = nullptr);
+ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result = nullptr);
+std::wstring FileName(IReceiverFile* file);
+
+// Downloads into memory streams.
+ComPtr<IStream> NewMemoryStream();
+HRESULT StartDownload(IReceiverFile* file, IStream* stream);
+std::string StreamBytes(IStream* stream);  // the whole content, wherever the position is
+ULONGLONG StreamPosition(IStream* stream);
+// A failure by which a client learns that the server has gone.
+bool IsServerGone(HRESULT hr);
 
 // A sink for any of the device manager's three event interfaces that records every call.
 // Subjects are kept, not read, inside the call: a handler never calls back into the server.
