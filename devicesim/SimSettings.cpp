@@ -46,8 +46,9 @@ const wchar_t SimSettings::kKey[] = L"Software\\Calvex\\DeviceSim";
 std::wstring SimSettings::RegistryRoot() {
     wchar_t root[MAX_PATH * 2] = L"";
     DWORD size = sizeof root;
-    if (RegGetValueW(HKEY_CURRENT_USER, kKey, L"Root", RRF_RT_REG_SZ | RRF_RT_REG_EXPAND_SZ, nullptr, root, &size) !=
-        ERROR_SUCCESS)
+    // RRF_RT_REG_EXPAND_SZ without RRF_NOEXPAND is ERROR_INVALID_PARAMETER.
+    if (RegGetValueW(HKEY_CURRENT_USER, kKey, L"Root", RRF_RT_REG_SZ | RRF_RT_REG_EXPAND_SZ | RRF_NOEXPAND, nullptr,
+                     root, &size) != ERROR_SUCCESS)
         return std::wstring();
     return root;
 }
