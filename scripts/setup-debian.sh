@@ -6,7 +6,7 @@ set -euo pipefail
 packages=(
   cmake make python3
   g++-mingw-w64-x86-64-posix mingw-w64-tools   # compiler, windres, widl
-  libwine-dev                                  # the .idl files that widl imports
+  libwine-dev wine64-tools                     # the .idl files widl imports; Wine's widl for type libraries
   wine wine64                                  # runs the DLL, the simulator and the tests
   xvfb xauth xdotool imagemagick               # windows without a screen, input, screenshots
   googletest                                   # sources, built with the MinGW toolchain
