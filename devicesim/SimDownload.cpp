@@ -37,12 +37,12 @@ bool SimDownload::Next(ULONGLONG now, Event* event) {
         return true;
     }
     if (m_plan.failAtPercent >= 0 && Percent() >= m_plan.failAtPercent) return End(m_plan.failResult, event);
+    if ((m_written > 0 || m_bytes.empty()) && Percent() != m_reported) {
+        m_reported = Percent();  // an empty file reports its 100 here
+        *event = Event{Step::Progress, Percent(), S_OK};
+        return true;
+    }
     if (m_written == m_bytes.size()) {
-        if (m_reported < 100) {
-            m_reported = 100;  // an empty file reports its 100 here
-            *event = Event{Step::Progress, 100, S_OK};
-            return true;
-        }
         LARGE_INTEGER start = {};
         HRESULT hr = m_stream->Seek(start, STREAM_SEEK_SET, nullptr);
         return End(SUCCEEDED(hr) ? S_OK : hr, event);
@@ -62,14 +62,7 @@ bool SimDownload::WriteDue(ULONGLONG now, Event* event) {
         if (FAILED(hr)) return End(hr, event);
         if (done != chunk) return End(STG_E_MEDIUMFULL, event);
         m_written += chunk;
-        const BYTE percent = Percent();
-        if (percent == m_reported) continue;
-        if ((m_plan.exitAtPercent >= 0 && percent >= m_plan.exitAtPercent) ||
-            (m_plan.failAtPercent >= 0 && percent >= m_plan.failAtPercent))
-            return Next(now, event);  // the fault's turn, before this percent is reported
-        m_reported = percent;
-        *event = Event{Step::Progress, percent, S_OK};
-        return true;
+        if (Percent() != m_reported) return Next(now, event);  // faults first, then the progress
     }
     return false;
 }
