@@ -35,6 +35,7 @@ SimTreeWatcher::~SimTreeWatcher() {
 
 bool SimTreeWatcher::Start() {
     if (!m_stop || !m_rearm) return false;
+    ResetEvent(m_rearm.Get());  // the thread reads the folders as it starts
     m_thread.Reset(CreateThread(nullptr, 0, ThreadProc, this, 0, nullptr));
     return static_cast<bool>(m_thread);
 }
@@ -77,6 +78,8 @@ bool SimTreeWatcher::WaitForChanges(const std::vector<std::wstring>& folders) {
         waits.push_back(change.Get());
         changes.push_back(std::move(change));
     }
+    // What changed since the last scan and before these handles were open would go unseen.
+    PostMessageW(m_target, m_message, 0, 0);
     for (;;) {
         DWORD result = WaitForMultipleObjects(static_cast<DWORD>(waits.size()), waits.data(), FALSE,
                                               poll ? kPollMilliseconds : INFINITE);
