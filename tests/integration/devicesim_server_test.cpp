@@ -193,3 +193,42 @@ TEST(DeviceSimServerTest, AnswersLateBoundCallsByName) {
     EXPECT_EQ(VT_I4, result.vt);
     EXPECT_EQ(8, result.lVal);
 }
+
+// (Wine's proxy of IClassFactory answers LockServer with E_NOTIMPL: only objects keep it here.)
+TEST(DeviceSimServerTest, EndsAShortTimeAfterItsLastObject) {
+    DeviceSimScope scope;
+    ComPtr<IReceiversColl> receivers = ReceiversOf(CreateDeviceManager().Get());
+    ASSERT_TRUE(receivers);
+    PumpMessagesFor(3000);
+    EXPECT_EQ(1, RunningDeviceSimServers());  // the collection alone keeps it
+    receivers.Reset();
+    const ULONGLONG released = GetTickCount64();
+    ASSERT_TRUE(PumpUntil([] { return RunningDeviceSimServers() == 0; }, 10000));
+    EXPECT_GE(GetTickCount64() - released, 1000u);  // it waits about two seconds for a new client
+}
+
+TEST(DeviceSimServerTest, ServesTheTreeNamedOnItsCommandLine) {
+    ReceiverTree tree;
+    tree.AddReceiver({L"only", 2, L"Only", L"CMD-1", L"R2", 1, L"COM9", {}});
+    DeviceSimScope scope;
+    std::wstring command = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" /Root \"" + tree.Root() + L"\"";
+    STARTUPINFOW startup = {sizeof startup};
+    PROCESS_INFORMATION info = {};
+    ASSERT_TRUE(CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &info));
+    CloseHandle(info.hThread);
+    CloseHandle(info.hProcess);
+    // The server makes its quit event just before it registers its class.
+    ASSERT_TRUE(PumpUntil([] {
+        HANDLE quit = OpenEventW(SYNCHRONIZE, FALSE, L"CalvexDeviceSim.Quit");
+        if (quit) CloseHandle(quit);
+        return quit != nullptr;
+    }, 10000));
+    PumpMessagesFor(500);
+    ComPtr<IReceiversColl> receivers = ReceiversOf(CreateDeviceManager().Get());
+    ASSERT_TRUE(receivers);
+    LONG count = 0;
+    ASSERT_EQ(S_OK, receivers->get_Count(&count));
+    EXPECT_EQ(1, count);
+    EXPECT_TRUE(ReceiverByKey(receivers.Get(), L"COM9-CMD-1"));
+    EXPECT_EQ(1, RunningDeviceSimServers());
+}

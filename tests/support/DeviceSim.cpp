@@ -1,5 +1,7 @@
 #include "support/DeviceSim.h"
 
+#include <tlhelp32.h>
+
 #include "com/Handles.h"
 
 namespace testsupport {
@@ -93,6 +95,16 @@ void StopDeviceSimServers() {
     UniqueHandle process(info.hProcess), thread(info.hThread);
     // Pumped: a quitting server releases its proxies of this thread's sinks.
     PumpUntil([&] { return WaitForSingleObject(process.Get(), 0) == WAIT_OBJECT_0; }, 30000);
+}
+
+int RunningDeviceSimServers() {
+    int count = 0;
+    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
+    PROCESSENTRY32W entry = {sizeof entry};
+    for (BOOL more = snapshot && Process32FirstW(snapshot.Get(), &entry); more;
+         more = Process32NextW(snapshot.Get(), &entry))
+        count += CompareStringOrdinal(entry.szExeFile, -1, L"CalvexDeviceSim.exe", -1, TRUE) == CSTR_EQUAL;
+    return count;
 }
 
 void UseDeviceSimRoot(const std::wstring& root) {

@@ -79,6 +79,8 @@ TEST_F(DeviceSimObjectsTest, OutPointersAndIndexesAreChecked) {
         {"receiver get_Item -1", [&] { return receivers->get_Item(-1, &object); }, E_INVALIDARG},
         {"receiver get_Item 2", [&] { return receivers->get_Item(2, &object); }, E_INVALIDARG},
         {"get_ItemByKey null key", [&] { return receivers->get_ItemByKey(nullptr, &object); }, E_INVALIDARG},
+        {"get_ItemBySerialNumber unknown", [&] { Bstr s(L"9"); return receivers->get_ItemBySerialNumber(s.Get(), &object); },
+         E_INVALIDARG},
         {"get_Label null", [&] { return base->get_Label(nullptr); }, E_POINTER},
         {"get_Brand null", [&] { return base->get_Brand(nullptr); }, E_POINTER},
         {"file get_Item 2", [&] { return files->get_Item(2, &object); }, E_INVALIDARG},
@@ -96,6 +98,9 @@ TEST_F(DeviceSimObjectsTest, OutPointersAndIndexesAreChecked) {
         EXPECT_FALSE(object) << c.call;
     }
     EXPECT_EQ(2, number);
+    Bstr serial(L"2");
+    ASSERT_EQ(S_OK, receivers->get_ItemBySerialNumber(serial.Get(), &object));
+    EXPECT_EQ(L"2", SubjectName(object.Get()));
 }
 
 TEST_F(DeviceSimObjectsTest, ConnectionPointsFollowTheirContract) {
