@@ -84,19 +84,13 @@ bool SimTreeWatcher::WaitForChanges(const std::vector<std::wstring>& folders) {
         DWORD result = WaitForMultipleObjects(static_cast<DWORD>(waits.size()), waits.data(), FALSE,
                                               poll ? kPollMilliseconds : INFINITE);
         if (result == WAIT_OBJECT_0) return false;
-        if (result == WAIT_OBJECT_0 + 1) return true;
         if (result == WAIT_TIMEOUT) {
             PostMessageW(m_target, m_message, 0, 0);
             continue;
         }
-        if (result < WAIT_OBJECT_0 + waits.size()) {
-            PostMessageW(m_target, m_message, 0, 0);
-            Sleep(kSettleMilliseconds);  // one message for a burst of changes
-            // A watched folder that has gone stays signalled; the rescan re-arms the list.
-            if (!FindNextChangeNotification(waits[result - WAIT_OBJECT_0])) return true;
-            continue;
-        }
-        Sleep(kPollMilliseconds);  // a failed wait: do not spin
-        PostMessageW(m_target, m_message, 0, 0);
+        // A change, or new folders to watch: open fresh handles (which posts). Re-arming with
+        // FindNextChangeNotification lost changes that came in quick succession under Wine.
+        if (result != WAIT_OBJECT_0 + 1) Sleep(kSettleMilliseconds);
+        return true;
     }
 }
