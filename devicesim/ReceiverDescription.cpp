@@ -82,30 +82,29 @@ bool ReceiverDescription::ParseReceiver(const IniText::Section& section, std::ws
 }
 
 bool ReceiverDescription::ParseTransfer(const IniText::Section& section, std::wstring* error) {
-    for (const IniText::Entry& entry : section.entries) {
-        long value = 0;
-        if (!ParseInteger32(entry.value, &value)) {
-            *error = EntryError(entry, L"is not a number");
-            return false;
-        }
-        std::wstring reason;
-        if (!faults.SetTransfer(entry.key, value, &reason)) {
-            *error = L"line " + std::to_wstring(entry.line) + L": " + reason;
-            return false;
-        }
-    }
-    return true;
+    return ParseNumbers(section, L"is not a number", error, [this](const IniText::Entry& entry, long value,
+                                                                   std::wstring* reason) {
+        return faults.SetTransfer(entry.key, value, reason);
+    });
 }
 
 bool ReceiverDescription::ParseFail(const IniText::Section& section, std::wstring* error) {
+    return ParseNumbers(section, L"is not a result code", error, [this](const IniText::Entry& entry, long value,
+                                                                       std::wstring* reason) {
+        return faults.SetCallFailure(entry.key, static_cast<HRESULT>(value), reason);
+    });
+}
+
+bool ReceiverDescription::ParseNumbers(const IniText::Section& section, const wchar_t* notANumber,
+                                       std::wstring* error, const NumberSetter& set) {
     for (const IniText::Entry& entry : section.entries) {
         long value = 0;
         if (!ParseInteger32(entry.value, &value)) {
-            *error = EntryError(entry, L"is not a result code");
+            *error = EntryError(entry, notANumber);
             return false;
         }
         std::wstring reason;
-        if (!faults.SetCallFailure(entry.key, static_cast<HRESULT>(value), &reason)) {
+        if (!set(entry, value, &reason)) {
             *error = L"line " + std::to_wstring(entry.line) + L": " + reason;
             return false;
         }

@@ -4,6 +4,7 @@
 #include <windows.h>
 #include <oleauto.h>
 
+#include <functional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -36,4 +37,8 @@ private:
     bool ParseTransfer(const IniText::Section& section, std::wstring* error);
     bool ParseFail(const IniText::Section& section, std::wstring* error);
     bool ParseTimes(const IniText::Section& section, std::wstring* error);
+    // Every entry a number handed to set, which may refuse it with a reason.
+    using NumberSetter = std::function<bool(const IniText::Entry&, long, std::wstring*)>;
+    static bool ParseNumbers(const IniText::Section& section, const wchar_t* notANumber, std::wstring* error,
+                             const NumberSetter& set);
 };

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "SimCreate.h"
 #include "SimReceiverFile.h"
 #include "SimResults.h"
 #include "SimVariantEnum.h"
@@ -15,11 +16,7 @@ SimFilesColl::~SimFilesColl() { m_model->RemoveListener(this); }
 
 HRESULT SimFilesColl::Create(const std::shared_ptr<SimModel>& model,
                              const std::shared_ptr<SimReceiverRecord>& record, IDispatch** out) {
-    *out = nullptr;
-    ComObject<SimFilesColl>* object = nullptr;
-    HRESULT hr = CreateComObject<SimFilesColl>(&object, model, record);
-    if (SUCCEEDED(hr)) *out = static_cast<IFilesColl*>(object);
-    return hr;
+    return CreateSimObject<SimFilesColl>(out, model, record);
 }
 
 STDMETHODIMP SimFilesColl::get__NewEnum(IUnknown** enumerator) {

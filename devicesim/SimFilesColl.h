@@ -18,6 +18,8 @@ public:
     static HRESULT Create(const std::shared_ptr<SimModel>& model, const std::shared_ptr<SimReceiverRecord>& record,
                           IDispatch** out);
 
+    using Primary = IFilesColl;  // the interface by which it is handed out
+
     BEGIN_INTERFACE_TABLE(SimFilesColl)
         INTERFACE_ENTRY(IFilesColl)
         INTERFACE_ENTRY_IID(IID_IDispatch, IFilesColl)

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "SimCreate.h"
 #include "SimFilesColl.h"
 #include "SimResults.h"
 
@@ -10,11 +11,7 @@ SimReceiver::SimReceiver(std::shared_ptr<SimModel> model, std::shared_ptr<SimRec
 
 HRESULT SimReceiver::Create(const std::shared_ptr<SimModel>& model,
                             const std::shared_ptr<SimReceiverRecord>& record, IDispatch** out) {
-    *out = nullptr;
-    ComObject<SimReceiver>* object = nullptr;
-    HRESULT hr = CreateComObject<SimReceiver>(&object, model, record);
-    if (SUCCEEDED(hr)) *out = static_cast<IReceiver*>(object);
-    return hr;
+    return CreateSimObject<SimReceiver>(out, model, record);
 }
 
 STDMETHODIMP SimReceiver::get_Files(IDispatch** files) {

@@ -13,6 +13,8 @@ public:
     static HRESULT Create(const std::shared_ptr<SimModel>& model, const std::shared_ptr<SimReceiverRecord>& record,
                           IDispatch** out);
 
+    using Primary = IReceiver;  // the interface by which it is handed out
+
     BEGIN_INTERFACE_TABLE(SimReceiver)
         INTERFACE_ENTRY(IReceiver)
         INTERFACE_ENTRY_IID(IID_IDispatch, IReceiver)

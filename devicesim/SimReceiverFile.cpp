@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "ReceiverTreeLoader.h"
+#include "SimCreate.h"
 #include "SimLog.h"
 #include "SimReceiver.h"
 #include "SimResults.h"
@@ -27,11 +28,7 @@ SimReceiverFile::SimReceiverFile(std::shared_ptr<SimModel> model, std::shared_pt
 HRESULT SimReceiverFile::Create(const std::shared_ptr<SimModel>& model,
                                 const std::shared_ptr<SimReceiverRecord>& receiver,
                                 const std::shared_ptr<SimFileRecord>& file, IDispatch** out) {
-    *out = nullptr;
-    ComObject<SimReceiverFile>* object = nullptr;
-    HRESULT hr = CreateComObject<SimReceiverFile>(&object, model, receiver, file);
-    if (SUCCEEDED(hr)) *out = static_cast<IReceiverFile*>(object);
-    return hr;
+    return CreateSimObject<SimReceiverFile>(out, model, receiver, file);
 }
 
 STDMETHODIMP SimReceiverFile::get_Name(BSTR* name) {

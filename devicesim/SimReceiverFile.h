@@ -20,6 +20,8 @@ public:
     static HRESULT Create(const std::shared_ptr<SimModel>& model, const std::shared_ptr<SimReceiverRecord>& receiver,
                           const std::shared_ptr<SimFileRecord>& file, IDispatch** out);
 
+    using Primary = IReceiverFile;  // the interface by which it is handed out
+
     BEGIN_INTERFACE_TABLE(SimReceiverFile)
         INTERFACE_ENTRY(IReceiverFile)
         INTERFACE_ENTRY_IID(IID_IDispatch, IReceiverFile)

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "SimCreate.h"
 #include "SimReceiver.h"
 #include "SimResults.h"
 #include "SimVariantEnum.h"
@@ -20,11 +21,7 @@ SimReceiversColl::SimReceiversColl(std::shared_ptr<SimModel> model)
 SimReceiversColl::~SimReceiversColl() { m_model->RemoveListener(this); }
 
 HRESULT SimReceiversColl::Create(const std::shared_ptr<SimModel>& model, IDispatch** out) {
-    *out = nullptr;
-    ComObject<SimReceiversColl>* object = nullptr;
-    HRESULT hr = CreateComObject<SimReceiversColl>(&object, model);
-    if (SUCCEEDED(hr)) *out = static_cast<IReceiversColl*>(object);
-    return hr;
+    return CreateSimObject<SimReceiversColl>(out, model);
 }
 
 STDMETHODIMP SimReceiversColl::get__NewEnum(IUnknown** enumerator) {

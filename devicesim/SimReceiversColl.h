@@ -18,6 +18,8 @@ public:
     ~SimReceiversColl() override;
     static HRESULT Create(const std::shared_ptr<SimModel>& model, IDispatch** out);
 
+    using Primary = IReceiversColl;  // the interface by which it is handed out
+
     BEGIN_INTERFACE_TABLE(SimReceiversColl)
         INTERFACE_ENTRY(IReceiversColl)
         INTERFACE_ENTRY_IID(IID_IDispatch, IReceiversColl)

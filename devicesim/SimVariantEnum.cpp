@@ -2,15 +2,13 @@
 
 #include <utility>
 
+#include "SimCreate.h"
+
 SimVariantEnum::SimVariantEnum(std::vector<ComPtr<IDispatch>> items, ULONG position)
     : m_items(std::move(items)), m_position(position) {}
 
 HRESULT SimVariantEnum::Create(std::vector<ComPtr<IDispatch>> items, IUnknown** out) {
-    *out = nullptr;
-    ComObject<SimVariantEnum>* object = nullptr;
-    HRESULT hr = CreateComObject<SimVariantEnum>(&object, std::move(items));
-    if (SUCCEEDED(hr)) *out = static_cast<IEnumVARIANT*>(object);
-    return hr;
+    return CreateSimObject<SimVariantEnum>(out, std::move(items));
 }
 
 STDMETHODIMP SimVariantEnum::Next(ULONG count, VARIANT* items, ULONG* fetched) {
@@ -39,9 +37,5 @@ STDMETHODIMP SimVariantEnum::Reset() {
 
 STDMETHODIMP SimVariantEnum::Clone(IEnumVARIANT** copy) {
     if (!copy) return E_POINTER;
-    *copy = nullptr;
-    ComObject<SimVariantEnum>* object = nullptr;
-    HRESULT hr = CreateComObject<SimVariantEnum>(&object, m_items, m_position);
-    if (SUCCEEDED(hr)) *copy = object;
-    return hr;
+    return CreateSimObject<SimVariantEnum>(copy, m_items, m_position);
 }

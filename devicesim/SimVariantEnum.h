@@ -14,6 +14,8 @@ public:
     explicit SimVariantEnum(std::vector<ComPtr<IDispatch>> items, ULONG position = 0);
     static HRESULT Create(std::vector<ComPtr<IDispatch>> items, IUnknown** out);
 
+    using Primary = IEnumVARIANT;  // the interface by which it is handed out
+
     BEGIN_INTERFACE_TABLE(SimVariantEnum)
         INTERFACE_ENTRY(IEnumVARIANT)
     END_INTERFACE_TABLE()

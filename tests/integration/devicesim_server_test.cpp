@@ -151,7 +151,9 @@ TEST(DeviceSimServerTest, FindsReceiversByKeyAndFilesByName) {
         ComPtr<IReceiver> receiver = ReceiverByKey(receivers.Get(), k.key, &hr);
         EXPECT_EQ(k.result, hr);
         ASSERT_EQ(k.serial != nullptr, static_cast<bool>(receiver));
-        if (receiver) EXPECT_EQ(k.serial, Text(&IReceiver::get_SerialNumber, receiver.Get()));
+        if (receiver) {
+            EXPECT_EQ(k.serial, Text(&IReceiver::get_SerialNumber, receiver.Get()));
+        }
     }
     ComPtr<IFilesColl> odd = FilesOf(ReceiverByKey(receivers.Get(), L"USB-BR-5500-0009").Get());
     ASSERT_TRUE(odd);
@@ -172,7 +174,9 @@ TEST(DeviceSimServerTest, FindsReceiversByKeyAndFilesByName) {
         HRESULT hr = E_FAIL;
         ComPtr<IReceiverFile> file = FileByName(odd.Get(), n.name, &hr);
         EXPECT_EQ(n.result, hr);
-        if (file) EXPECT_EQ(n.name, FileName(file.Get()));
+        if (file) {
+            EXPECT_EQ(n.name, FileName(file.Get()));
+        }
     }
 }
 

@@ -21,33 +21,6 @@ namespace {
 
 const DWORD kFinishWait = 15000;  // bounds every wait: a lost event must not hang the run
 
-std::vector<int> ProgressPercents(const SimEventRecorder& recorder) {
-    std::vector<int> percents;
-    for (const auto& event : recorder.Events())
-        if (event.id == 2) percents.push_back(event.second.bVal);
-    return percents;
-}
-
-HRESULT FinishResult(const SimEventRecorder& recorder) {
-    for (const auto& event : recorder.Events())
-        if (event.id == 3) return event.second.lVal;
-    return S_FALSE;
-}
-
-struct Download {
-    ComPtr<IReceiverFile> file;
-    ComPtr<IStream> stream = NewMemoryStream();
-    ComPtr<SimEventRecorder> events = SimEventRecorder::Create(DIID__IReceiverFileEvents);
-    HRESULT started = E_FAIL;
-
-    explicit Download(ComPtr<IReceiverFile> f) : file(std::move(f)) {
-        if (!file) return;
-        if (SUCCEEDED(events->Advise(file.Get()))) started = StartDownload(file.Get(), stream.Get());
-    }
-    ~Download() { events->Unadvise(); }
-    bool WaitForFinish() { return events->WaitFor(3, kFinishWait); }
-};
-
 ComPtr<IReceiverFile> TreeFile(IDeviceMgr* manager, const wchar_t* key, const wchar_t* name) {
     ComPtr<IFilesColl> files = FilesOf(ReceiverByKey(ReceiversOf(manager).Get(), key).Get());
     return files ? FileByName(files.Get(), name) : nullptr;
@@ -58,23 +31,23 @@ ComPtr<IReceiverFile> TreeFile(IDeviceMgr* manager, const wchar_t* key, const wc
 TEST(DeviceSimTransferTest, DownloadReportsRisingProgressAndRewindsTheStream) {
     DeviceSimScope scope;
     ComPtr<IDeviceMgr> manager = CreateDeviceManager();
-    Download download(TreeFile(manager.Get(), L"USB-HV3-0042117", L"20261103A.T02"));
-    ASSERT_EQ(S_OK, download.started);
-    ASSERT_TRUE(download.WaitForFinish());
-    const auto& events = download.events->Events();
+    RecordedDownload download(TreeFile(manager.Get(), L"USB-HV3-0042117", L"20261103A.T02"));
+    ASSERT_EQ(S_OK, download.Started());
+    ASSERT_TRUE(download.WaitForFinish(kFinishWait));
+    const auto& events = download.Events().Events();
     ASSERT_FALSE(events.empty());
     EXPECT_EQ(1, events.front().id);  // OnFileBegin first
     EXPECT_EQ(3, events.back().id);   // OnFileFinish last
-    EXPECT_EQ(S_OK, FinishResult(*download.events.Get()));
-    std::vector<int> percents = ProgressPercents(*download.events.Get());
+    EXPECT_EQ(S_OK, download.FinishResult());
+    std::vector<int> percents = download.Percents();
     ASSERT_FALSE(percents.empty());
     for (size_t i = 1; i < percents.size(); ++i) EXPECT_LT(percents[i - 1], percents[i]);
     EXPECT_EQ(100, percents.back());
-    EXPECT_EQ(0u, StreamPosition(download.stream.Get()));
+    EXPECT_EQ(0u, StreamPosition(download.Stream()));
     EXPECT_EQ(ReadFileBytes(SampleReceiversDir() + L"\\Brennor HVL3 USB\\20261103A.T02"),
-              StreamBytes(download.stream.Get()));
+              StreamBytes(download.Stream()));
     VARIANT_BOOL running = VARIANT_TRUE;
-    EXPECT_EQ(S_OK, download.file->get_Downloading(&running));
+    EXPECT_EQ(S_OK, download.File()->get_Downloading(&running));
     EXPECT_EQ(VARIANT_FALSE, running);
 }
 
@@ -83,15 +56,15 @@ TEST(DeviceSimTransferTest, CancelEndsASlowDownloadWithTheCancelledResult) {
     tree.AddReceiver({L"serial", 1, L"Serial", L"700-1", L"Q7", 1, L"COM5", {L"[Transfer]", L"Rate=2000"}});
     tree.AddFile(L"serial", L"LOG0001", 20000);  // ten seconds at this rate
     DeviceSimScope scope(tree.Root());
-    Download download(TreeFile(CreateDeviceManager().Get(), L"COM5-700-1", L"LOG0001"));
-    ASSERT_EQ(S_OK, download.started);
-    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_BUSY), StartDownload(download.file.Get(), NewMemoryStream().Get()));
-    ASSERT_TRUE(download.events->WaitFor(2, kFinishWait));
-    EXPECT_EQ(S_OK, download.file->Cancel());
-    ASSERT_TRUE(download.WaitForFinish());
-    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_CANCELLED), FinishResult(*download.events.Get()));
-    EXPECT_LT(ProgressPercents(*download.events.Get()).back(), 100);
-    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_INVALID_STATE), download.file->Cancel());
+    RecordedDownload download(TreeFile(CreateDeviceManager().Get(), L"COM5-700-1", L"LOG0001"));
+    ASSERT_EQ(S_OK, download.Started());
+    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_BUSY), StartDownload(download.File(), NewMemoryStream().Get()));
+    ASSERT_TRUE(download.Events().WaitFor(2, kFinishWait));
+    EXPECT_EQ(S_OK, download.File()->Cancel());
+    ASSERT_TRUE(download.WaitForFinish(kFinishWait));
+    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_CANCELLED), download.FinishResult());
+    EXPECT_LT(download.Percents().back(), 100);
+    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_INVALID_STATE), download.File()->Cancel());
 }
 
 TEST(DeviceSimTransferTest, DeleteRemovesTheTreeFileAndTheWatcherReportsIt) {
@@ -174,11 +147,11 @@ TEST(DeviceSimTransferTest, DownloadFailsAtTheConfiguredPercent) {
     } cases[] = {{L"USB-950-1", 40, HRESULT_FROM_WIN32(ERROR_GEN_FAILURE)}, {L"USB-950-2", 70, E_ABORT}};
     for (const auto& c : cases) {
         SCOPED_TRACE(Narrow(c.key));
-        Download download(TreeFile(manager.Get(), c.key, L"20261103A.T02"));
-        ASSERT_EQ(S_OK, download.started);
-        ASSERT_TRUE(download.WaitForFinish());
-        EXPECT_EQ(c.result, FinishResult(*download.events.Get()));
-        std::vector<int> percents = ProgressPercents(*download.events.Get());
+        RecordedDownload download(TreeFile(manager.Get(), c.key, L"20261103A.T02"));
+        ASSERT_EQ(S_OK, download.Started());
+        ASSERT_TRUE(download.WaitForFinish(kFinishWait));
+        EXPECT_EQ(c.result, download.FinishResult());
+        std::vector<int> percents = download.Percents();
         ASSERT_FALSE(percents.empty());
         EXPECT_LT(percents.back(), c.percent);
     }
@@ -192,20 +165,20 @@ TEST(DeviceSimTransferTest, ServerDyingMidDownloadTurnsIntoFailedCallsNotAHang) 
     DeviceSimScope scope(tree.Root());
     ComPtr<IDeviceMgr> manager = CreateDeviceManager();
     ComPtr<IReceiversColl> receivers = ReceiversOf(manager.Get());
-    Download download(TreeFile(manager.Get(), L"USB-990-1", L"LOG0001"));
-    ASSERT_EQ(S_OK, download.started);
+    RecordedDownload download(TreeFile(manager.Get(), L"USB-990-1", L"LOG0001"));
+    ASSERT_EQ(S_OK, download.Started());
     HRESULT hr = S_OK;
     const bool gone = PumpUntil(
         [&] {
             VARIANT_BOOL running;
-            hr = download.file->get_Downloading(&running);
+            hr = download.File()->get_Downloading(&running);
             return FAILED(hr);
         },
         kFinishWait);
     ASSERT_TRUE(gone) << "the server did not end";
     EXPECT_TRUE(IsServerGone(hr)) << std::hex << hr;
-    EXPECT_EQ(0u, download.events->Count(3));  // no finish: the server died first
-    for (int percent : ProgressPercents(*download.events.Get())) EXPECT_LT(percent, 30);
+    EXPECT_EQ(0u, download.Events().Count(3));  // no finish: the server died first
+    for (int percent : download.Percents()) EXPECT_LT(percent, 30);
     LONG count = 0;
     hr = receivers->get_Count(&count);
     EXPECT_TRUE(IsServerGone(hr)) << std::hex << hr;

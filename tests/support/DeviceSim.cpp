@@ -2,6 +2,7 @@
 
 #include <tlhelp32.h>
 
+#include "com/Bstr.h"
 #include "com/Handles.h"
 
 namespace testsupport {
@@ -137,17 +138,15 @@ DeviceSimScope::~DeviceSimScope() { RestoreDeviceSimDefaults(); }
 
 namespace {
 
-template <class T>
-ComPtr<T> Query(IDispatch* object, REFIID iid) {
+// Runs one call that hands out an object and queries it for T.
+template <class T, class Call>
+ComPtr<T> Fetch(Call call, REFIID iid, HRESULT* result = nullptr) {
+    ComPtr<IDispatch> object;
+    HRESULT hr = call(object.ReleaseAndGetAddressOf());
+    if (result) *result = hr;
     ComPtr<T> out;
     if (object) object->QueryInterface(iid, out.PutVoid());
     return out;
-}
-
-template <class T>
-ComPtr<T> Kept(HRESULT hr, HRESULT* result, const ComPtr<IDispatch>& object, REFIID iid) {
-    if (result) *result = hr;
-    return Query<T>(object.Get(), iid);
 }
 
 }  // namespace
@@ -160,53 +159,40 @@ ComPtr<IDeviceMgr> CreateDeviceManager(HRESULT* result) {
 }
 
 ComPtr<IReceiversColl> ReceiversOf(IDeviceMgr* manager) {
-    ComPtr<IDispatch> object;
     if (!manager) return nullptr;
-    HRESULT hr = manager->get_Receivers(&object);
-    return Kept<IReceiversColl>(hr, nullptr, object, IID_IReceiversColl);
+    return Fetch<IReceiversColl>([&](IDispatch** out) { return manager->get_Receivers(out); }, IID_IReceiversColl);
 }
 
 ComPtr<IReceiver> ReceiverAt(IReceiversColl* receivers, LONG index, HRESULT* result) {
-    ComPtr<IDispatch> object;
-    HRESULT hr = receivers->get_Item(index, &object);
-    return Kept<IReceiver>(hr, result, object, IID_IReceiver);
+    return Fetch<IReceiver>([&](IDispatch** out) { return receivers->get_Item(index, out); }, IID_IReceiver, result);
 }
 
 ComPtr<IReceiver> ReceiverByKey(IReceiversColl* receivers, const std::wstring& key, HRESULT* result) {
-    ComPtr<IDispatch> object;
-    BSTR text = SysAllocStringLen(key.data(), static_cast<UINT>(key.size()));
-    HRESULT hr = receivers->get_ItemByKey(text, &object);
-    SysFreeString(text);
-    return Kept<IReceiver>(hr, result, object, IID_IReceiver);
+    Bstr text(key);
+    return Fetch<IReceiver>([&](IDispatch** out) { return receivers->get_ItemByKey(text.Get(), out); },
+                            IID_IReceiver, result);
 }
 
 ComPtr<IFilesColl> FilesOf(IReceiver* receiver) {
-    ComPtr<IDispatch> object;
     if (!receiver) return nullptr;
-    HRESULT hr = receiver->get_Files(&object);
-    return Kept<IFilesColl>(hr, nullptr, object, IID_IFilesColl);
+    return Fetch<IFilesColl>([&](IDispatch** out) { return receiver->get_Files(out); }, IID_IFilesColl);
 }
 
 ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result) {
-    ComPtr<IDispatch> object;
-    HRESULT hr = files->get_Item(index, &object);
-    return Kept<IReceiverFile>(hr, result, object, IID_IReceiverFile);
+    return Fetch<IReceiverFile>([&](IDispatch** out) { return files->get_Item(index, out); }, IID_IReceiverFile,
+                                result);
 }
 
 ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result) {
-    ComPtr<IDispatch> object;
-    BSTR text = SysAllocStringLen(name.data(), static_cast<UINT>(name.size()));
-    HRESULT hr = files->get_ItemByName(text, &object);
-    SysFreeString(text);
-    return Kept<IReceiverFile>(hr, result, object, IID_IReceiverFile);
+    Bstr text(name);
+    return Fetch<IReceiverFile>([&](IDispatch** out) { return files->get_ItemByName(text.Get(), out); },
+                                IID_IReceiverFile, result);
 }
 
 std::wstring FileName(IReceiverFile* file) {
-    BSTR text = nullptr;
-    if (!file || FAILED(file->get_Name(&text))) return std::wstring();
-    std::wstring name(text ? text : L"", text ? SysStringLen(text) : 0);
-    SysFreeString(text);
-    return name;
+    Bstr text;
+    if (file) file->get_Name(text.Put());
+    return text.Str();
 }
 
 ComPtr<IStream> NewMemoryStream() {
@@ -309,6 +295,29 @@ bool SimEventRecorder::WaitFor(DISPID id, DWORD timeoutMilliseconds, size_t coun
 void SimEventRecorder::Clear() {
     for (Event& event : m_received) VariantClear(&event.second);
     m_received.clear();
+}
+
+RecordedDownload::RecordedDownload(ComPtr<IReceiverFile> file)
+    : m_file(std::move(file)), m_stream(NewMemoryStream()), m_events(SimEventRecorder::Create(DIID__IReceiverFileEvents)) {
+    if (m_file && SUCCEEDED(m_started = m_events->Advise(m_file.Get())))
+        m_started = StartDownload(m_file.Get(), m_stream.Get());
+}
+
+RecordedDownload::~RecordedDownload() { m_events->Unadvise(); }
+
+bool RecordedDownload::WaitForFinish(DWORD timeoutMilliseconds) const { return m_events->WaitFor(3, timeoutMilliseconds); }
+
+HRESULT RecordedDownload::FinishResult() const {
+    for (const auto& event : m_events->Events())
+        if (event.id == 3) return event.second.lVal;
+    return S_FALSE;
+}
+
+std::vector<int> RecordedDownload::Percents() const {
+    std::vector<int> percents;
+    for (const auto& event : m_events->Events())
+        if (event.id == 2) percents.push_back(event.second.bVal);
+    return percents;
 }
 
 std::wstring SubjectName(IDispatch* subject) {

@@ -139,6 +139,30 @@ private:
     std::vector<Event> m_received;
 };
 
+// One download into a memory stream, started at construction, with its events recorded.
+class RecordedDownload {
+public:
+    explicit RecordedDownload(ComPtr<IReceiverFile> file);
+    ~RecordedDownload();
+    RecordedDownload(const RecordedDownload&) = delete;
+    RecordedDownload& operator=(const RecordedDownload&) = delete;
+
+    HRESULT Started() const { return m_started; }
+    // Pumps messages until OnFileFinish; false after the timeout.
+    bool WaitForFinish(DWORD timeoutMilliseconds = 15000) const;
+    HRESULT FinishResult() const;  // S_FALSE while there is none
+    std::vector<int> Percents() const;  // of the progress events, in order
+    IReceiverFile* File() const { return m_file.Get(); }
+    IStream* Stream() const { return m_stream.Get(); }
+    const SimEventRecorder& Events() const { return *m_events.Get(); }
+
+private:
+    ComPtr<IReceiverFile> m_file;
+    ComPtr<IStream> m_stream;
+    ComPtr<SimEventRecorder> m_events;
+    HRESULT m_started = E_FAIL;
+};
+
 // The name of what an event is about: a file's name or a receiver's serial number.
 std::wstring SubjectName(IDispatch* subject);
 

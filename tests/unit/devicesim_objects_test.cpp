@@ -176,15 +176,12 @@ TEST_F(DeviceSimObjectsTest, ObjectsOutliveTheirFileAndReceiver) {
 TEST_F(DeviceSimObjectsTest, AnAbruptExitIsOnlyLoggedInATestProcess) {
     ComPtr<IReceiverFile> file = FileByName(FilesOf(ReceiverByKey(receivers.Get(), L"USB-2").Get()).Get(), L"LOG0001");
     ASSERT_TRUE(file);
-    ComPtr<SimEventRecorder> events = SimEventRecorder::Create(DIID__IReceiverFileEvents);
-    ASSERT_EQ(S_OK, events->Advise(file.Get()));
-    ComPtr<IStream> stream = NewMemoryStream();
-    ASSERT_EQ(S_OK, StartDownload(file.Get(), stream.Get()));
-    ASSERT_TRUE(events->WaitFor(3, 5000));
-    EXPECT_EQ(S_OK, events->Events().back().second.lVal);
-    EXPECT_EQ(ReadFileBytes(tree.FolderPath(L"rover") + L"\\LOG0001"), StreamBytes(stream.Get()));
+    RecordedDownload download(file);
+    ASSERT_EQ(S_OK, download.Started());
+    ASSERT_TRUE(download.WaitForFinish(5000));
+    EXPECT_EQ(S_OK, download.FinishResult());
+    EXPECT_EQ(ReadFileBytes(tree.FolderPath(L"rover") + L"\\LOG0001"), StreamBytes(download.Stream()));
     EXPECT_NE(std::string::npos, ReadFileBytes(SimLog::Path()).find("abrupt exit not acted out in this process"));
-    events->Unadvise();
 }
 
 TEST_F(DeviceSimObjectsTest, NewEnumWalksTheReceivers) {
@@ -219,12 +216,9 @@ TEST_F(DeviceSimObjectsTest, NothingStaysAliveOnceTheClientLetsGo) {
         ComPtr<IDeviceMgr> made = Create();
         ComPtr<IReceiverFile> file = FileAt(FilesOf(ReceiverAt(ReceiversOf(made.Get()).Get(), 0).Get()).Get(), 0);
         ASSERT_TRUE(file);
-        ComPtr<SimEventRecorder> events = SimEventRecorder::Create(DIID__IReceiverFileEvents);
-        ASSERT_EQ(S_OK, events->Advise(file.Get()));
-        ComPtr<IStream> stream = NewMemoryStream();
-        ASSERT_EQ(S_OK, StartDownload(file.Get(), stream.Get()));
-        ASSERT_TRUE(events->WaitFor(3, 5000));
-        events->Unadvise();
+        RecordedDownload download(file);
+        ASSERT_EQ(S_OK, download.Started());
+        ASSERT_TRUE(download.WaitForFinish(5000));
     }
     EXPECT_EQ(before, ModuleLock::Count());
 }
