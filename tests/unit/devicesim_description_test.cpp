@@ -97,7 +97,9 @@ TEST(DeviceSimDescriptionTest, ReadsNumbersAsDecimalOrHexadecimal32Bits) {
     for (const auto& c : cases) {
         long value = 0;
         EXPECT_EQ(c.ok, ParseInteger32(c.text, &value)) << c.text;
-        if (c.ok) EXPECT_EQ(c.value, value) << c.text;
+        if (c.ok) {
+            EXPECT_EQ(c.value, value) << c.text;
+        }
     }
 }
 
