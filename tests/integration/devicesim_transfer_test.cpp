@@ -109,11 +109,7 @@ TEST(DeviceSimTransferTest, ConfiguredCallFaultsGiveTheirResults) {
     ASSERT_TRUE(files);
     Bstr text;
     LONG number = 0;
-    const struct {
-        const char* call;
-        std::function<HRESULT()> make;
-        HRESULT expected;
-    } cases[] = {
+    const CallCase cases[] = {
         {"faulty get_Label", [&] { return faulty->get_Label(text.Put()); }, E_FAIL},
         {"plain get_Label", [&] { return plain->get_Label(text.Put()); }, S_OK},
         {"faulty get_Brand (a success code)", [&] { return faulty->get_Brand(&number); }, S_FALSE},

@@ -5,6 +5,7 @@
 // its test program must run alone (a sibling <stem>.cmake with set(TEST_SERIAL SERIAL)).
 #include <windows.h>
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -88,6 +89,13 @@ ComPtr<IFilesColl> FilesOf(IReceiver* receiver);
 ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result = nullptr);
 ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result = nullptr);
 std::wstring FileName(IReceiverFile* file);
+
+// One row of a table of calls and the result each must give.
+struct CallCase {
+    const char* call;
+    std::function<HRESULT()> make;
+    HRESULT expected;
+};
 
 // Downloads into memory streams.
 ComPtr<IStream> NewMemoryStream();

@@ -67,11 +67,7 @@ TEST_F(DeviceSimObjectsTest, OutPointersAndIndexesAreChecked) {
     ASSERT_TRUE(file);
     ComPtr<IDispatch> object;
     LONG number = 0;
-    const struct {
-        const char* call;
-        std::function<HRESULT()> make;
-        HRESULT expected;
-    } cases[] = {
+    const CallCase cases[] = {
         {"CreateSimDeviceManager null out", [&] { return CreateSimDeviceManager(L"C:\\", IID_IDeviceMgr, nullptr); },
          E_POINTER},
         {"get_Receivers null", [&] { return manager->get_Receivers(nullptr); }, E_POINTER},
