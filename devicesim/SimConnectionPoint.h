@@ -27,7 +27,6 @@ public:
     STDMETHODIMP EnumConnections(IEnumConnections** connections) override;
 
     REFIID Events() const { return m_events; }
-    size_t SinkCount() const { return m_sinks.size(); }
     // Calls DISPID id on every sink with (subject[, second]). A sink whose process has gone
     // is dropped; other failures of a sink are its own business.
     void Fire(DISPID id, IDispatch* subject, const VARIANT* second = nullptr);

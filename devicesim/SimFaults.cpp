@@ -35,8 +35,6 @@ long Pick(const Setting& mine, const Setting& global, long fallback) {
 
 }  // namespace
 
-bool SimFaults::IsKnownCall(const std::wstring& call) { return CanonicalCall(call) != nullptr; }
-
 bool SimFaults::SetCallFailure(const std::wstring& name, HRESULT result, std::wstring* error) {
     size_t colon = name.find(L':');
     const wchar_t* call = CanonicalCall(name.substr(0, colon));
@@ -89,10 +87,6 @@ bool SimFaults::FindCall(const wchar_t* call, const std::wstring& target, HRESUL
     if (found == m_calls.end()) return false;
     *result = found->second;
     return true;
-}
-
-bool SimFaults::Empty() const {
-    return m_calls.empty() && !m_rate.set && !m_failAtPercent.set && !m_failResult.set && !m_exitAtPercent.set;
 }
 
 SimTransferPlan SimFaults::Plan(const SimFaults& receiver, const SimFaults& global) {

@@ -19,14 +19,12 @@ class SimFaults {
 public:
     // Call names are "Interface.method" as the contract spells them, "IReceiver.get_Label";
     // a file-level call may name one file after a colon: "IFilesColl.get_Item:LOG0002".
-    static bool IsKnownCall(const std::wstring& call);
     bool SetCallFailure(const std::wstring& name, HRESULT result, std::wstring* error);
     // One key of the transfer settings (Rate, FailAtPercent, FailResult, ExitAtPercent).
     bool SetTransfer(const std::wstring& key, long value, std::wstring* error);
 
     // The failure set for call on target (a file name, or empty), the targeted entry first.
     bool FindCall(const wchar_t* call, const std::wstring& target, HRESULT* result) const;
-    bool Empty() const;
     // Receiver settings win over the global ones, key by key.
     static SimTransferPlan Plan(const SimFaults& receiver, const SimFaults& global);
 

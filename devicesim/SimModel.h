@@ -51,7 +51,6 @@ public:
     SimModel(const SimModel&) = delete;
     SimModel& operator=(const SimModel&) = delete;
 
-    const std::wstring& Root() const { return m_root; }
     const std::vector<std::shared_ptr<SimReceiverRecord>>& Receivers() const { return m_receivers; }
 
     // Reads the tree again and fires the events of what changed.
