@@ -10,33 +10,11 @@
 
 #include "module/ClassIds.h"
 #include "module/Settings.h"
+#include "support/LoadedModule.h"
 #include "support/TestSupport.h"
 
 namespace {
-using GetClassObjectFn = HRESULT(STDAPICALLTYPE*)(REFCLSID, REFIID, void**);
-using CanUnloadNowFn = HRESULT(STDAPICALLTYPE*)();
-
-class LoadedModule {
-public:
-    LoadedModule() : m_module(LoadLibraryW(testsupport::ModuleDllPath().c_str())) {
-        if (m_module) {
-            getClassObject = reinterpret_cast<GetClassObjectFn>(GetProcAddress(m_module, "DllGetClassObject"));
-            canUnloadNow = reinterpret_cast<CanUnloadNowFn>(GetProcAddress(m_module, "DllCanUnloadNow"));
-        }
-    }
-    ~LoadedModule() { Unload(); }
-    void Unload() {
-        if (m_module) FreeLibrary(m_module);
-        m_module = nullptr;
-    }
-    bool Loaded() const { return m_module && getClassObject && canUnloadNow; }
-
-    GetClassObjectFn getClassObject = nullptr;
-    CanUnloadNowFn canUnloadNow = nullptr;
-
-private:
-    HMODULE m_module;
-};
+using testsupport::LoadedModule;
 
 IClassFactory* Factory(LoadedModule& module, const CLSID& clsid) {
     IClassFactory* factory = nullptr;
@@ -179,15 +157,7 @@ TEST(ModuleEntry, SecondProcessLeavesTheHeldTraceFileAlone) {
 
     // regsvr32 loads the module in a process of its own (inheriting our %TEMP%): it cannot
     // open the trace file that we hold, so it works on without tracing.
-    std::wstring command = L"regsvr32.exe /s \"" + testsupport::ModuleDllPath() + L"\"";
-    STARTUPINFOW startup = {sizeof startup};
-    PROCESS_INFORMATION process = {};
-    ASSERT_TRUE(CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process));
-    ASSERT_EQ(WAIT_OBJECT_0, WaitForSingleObject(process.hProcess, 60000));
-    DWORD exitCode = 1;
-    GetExitCodeProcess(process.hProcess, &exitCode);
-    CloseHandle(process.hThread);
-    CloseHandle(process.hProcess);
-    EXPECT_EQ(0u, exitCode) << "registration works without a trace";
+    EXPECT_EQ(0u, testsupport::RunProcess(L"regsvr32.exe /s \"" + testsupport::ModuleDllPath() + L"\""))
+        << "registration works without a trace";
     EXPECT_EQ(before, testsupport::ReadTraceLog());
 }

@@ -44,17 +44,7 @@ HRESULT CallExport(const char* name) {
 }
 
 DWORD RunRegsvr32(const std::wstring& flags) {
-    std::wstring command = L"regsvr32.exe " + flags + L" \"" + testsupport::ModuleDllPath() + L"\"";
-    STARTUPINFOW startup = {sizeof startup};
-    PROCESS_INFORMATION process = {};
-    if (!CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
-        return GetLastError();
-    WaitForSingleObject(process.hProcess, 60000);
-    DWORD code = 1;
-    GetExitCodeProcess(process.hProcess, &code);
-    CloseHandle(process.hThread);
-    CloseHandle(process.hProcess);
-    return code;
+    return testsupport::RunProcess(L"regsvr32.exe " + flags + L" \"" + testsupport::ModuleDllPath() + L"\"");
 }
 
 void ExpectRegistered() {

@@ -14,13 +14,12 @@
 #include "com/Handles.h"
 #include "module/ClassIds.h"
 #include "support/DeviceSim.h"
+#include "support/LoadedModule.h"
 #include "support/TestSupport.h"
 
 using namespace testsupport;
 
 namespace {
-using GetClassObjectFn = HRESULT(STDAPICALLTYPE*)(REFCLSID, REFIID, void**);
-using CanUnloadNowFn = HRESULT(STDAPICALLTYPE*)();
 
 size_t ThreadCount() {
     size_t count = 0;
@@ -73,42 +72,19 @@ std::vector<DWORD> SimulatorProcesses() {
 
 // Runs the simulator with one switch (/RegServer, /UnregServer) and waits for it.
 DWORD RunSimulator(const wchar_t* option) {
-    std::wstring command = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" " + option;
-    STARTUPINFOW startup = {sizeof startup};
-    PROCESS_INFORMATION process = {};
-    if (!CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
-        return GetLastError();
-    UniqueHandle processHandle(process.hProcess), threadHandle(process.hThread);
-    WaitForSingleObject(process.hProcess, 60000);
-    DWORD exitCode = 1;
-    GetExitCodeProcess(process.hProcess, &exitCode);
-    return exitCode;
+    return RunProcess(L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" " + option);
 }
 
-// The built DLL, loaded as Explorer loads it.
-class LoadedModule {
-public:
-    LoadedModule() : m_module(LoadLibraryW(ModuleDllPath().c_str())) {
-        getClassObject = reinterpret_cast<GetClassObjectFn>(GetProcAddress(m_module.Get(), "DllGetClassObject"));
-        canUnloadNow = reinterpret_cast<CanUnloadNowFn>(GetProcAddress(m_module.Get(), "DllCanUnloadNow"));
-    }
-    HMODULE Handle() const { return m_module.Get(); }
-    ComPtr<IShellFolder> NewRootFolder(const CLSID& clsid) {
-        ComPtr<IClassFactory> factory;
-        ComPtr<IShellFolder> folder;
-        if (FAILED(getClassObject(clsid, IID_IClassFactory, factory.PutVoid()))) return folder;
-        if (FAILED(factory->CreateInstance(nullptr, IID_IShellFolder, folder.PutVoid()))) return folder;
-        ComPtr<IPersistFolder> persist;
-        folder.QueryTo(IID_IPersistFolder, persist.PutVoid());
-        if (persist) persist->Initialize(nullptr);
-        return folder;
-    }
-    GetClassObjectFn getClassObject = nullptr;
-    CanUnloadNowFn canUnloadNow = nullptr;
-
-private:
-    UniqueLibrary m_module;
-};
+ComPtr<IShellFolder> NewRootFolder(LoadedModule& module, const CLSID& clsid) {
+    ComPtr<IClassFactory> factory;
+    ComPtr<IShellFolder> folder;
+    if (FAILED(module.getClassObject(clsid, IID_IClassFactory, factory.PutVoid()))) return folder;
+    if (FAILED(factory->CreateInstance(nullptr, IID_IShellFolder, folder.PutVoid()))) return folder;
+    ComPtr<IPersistFolder> persist;
+    folder.QueryTo(IID_IPersistFolder, persist.PutVoid());
+    if (persist) persist->Initialize(nullptr);
+    return folder;
+}
 
 struct Listing {
     HRESULT result;
@@ -128,7 +104,7 @@ void List(IShellFolder* folder, SHCONTF flags, Listing& listing) {
 // One folder bound and released; listed and walked into a receiver, as a user opening a
 // receiver does, when asked.
 void BindAndRelease(LoadedModule& module, const CLSID& clsid, bool intoReceiver) {
-    ComPtr<IShellFolder> root = module.NewRootFolder(clsid);
+    ComPtr<IShellFolder> root = NewRootFolder(module, clsid);
     ASSERT_TRUE(root);
     Listing receivers;
     List(root.Get(), intoReceiver ? SHCONTF_FOLDERS : 0, receivers);  // no flags: bound, nothing read
@@ -148,7 +124,7 @@ TEST(ShellFolderLifetime, ThousandBoundFoldersLeaveNothingBehind) {
     // Warm up: the type library, COM's own threads and the server.
     for (int i = 0; i < 5; ++i) BindAndRelease(module, CLSID_CalvexReceiversShellFolder, true);
     {
-        ComPtr<IShellFolder> alive = module.NewRootFolder(CLSID_BrennorReceiversShellFolder);
+        ComPtr<IShellFolder> alive = NewRootFolder(module, CLSID_BrennorReceiversShellFolder);
         ASSERT_EQ(1u, ThreadsStartedIn(module.Handle())) << "a live folder has its thread";
     }
     PumpMessagesFor(500);
@@ -170,7 +146,7 @@ TEST(ShellFolderLifetime, ThousandBoundFoldersLeaveNothingBehind) {
 TEST(ShellFolderLifetime, KilledDeviceManagerMakesFoldersFailOrListNothing) {
     DeviceSimScope scope;
     LoadedModule module;
-    ComPtr<IShellFolder> root = module.NewRootFolder(CLSID_CalvexReceiversShellFolder);
+    ComPtr<IShellFolder> root = NewRootFolder(module, CLSID_CalvexReceiversShellFolder);
     ASSERT_TRUE(root);
     Listing receivers;
     List(root.Get(), SHCONTF_FOLDERS, receivers);
@@ -211,7 +187,7 @@ TEST(ShellFolderLifetime, UnregisteredDeviceManagerGivesAnEmptyFolderAndOnlySucc
         LoadedModule module;
         const CLSID* classes[] = {&CLSID_CalvexReceiversShellFolder, &CLSID_BrennorReceiversShellFolder};
         for (const CLSID* clsid : classes) {
-            ComPtr<IShellFolder> root = module.NewRootFolder(*clsid);
+            ComPtr<IShellFolder> root = NewRootFolder(module, *clsid);
             ASSERT_TRUE(root);
             Listing receivers;
             List(root.Get(), SHCONTF_FOLDERS | SHCONTF_NONFOLDERS, receivers);

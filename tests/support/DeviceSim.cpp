@@ -89,13 +89,8 @@ std::string ReadFileBytes(const std::wstring& path) {
 bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
 void StopDeviceSimServers() {
-    std::wstring command = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" /Quit";
-    STARTUPINFOW startup = {sizeof startup};
-    PROCESS_INFORMATION info = {};
-    if (!CreateProcessW(nullptr, &command[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &info)) return;
-    UniqueHandle process(info.hProcess), thread(info.hThread);
     // Pumped: a quitting server releases its proxies of this thread's sinks.
-    PumpUntil([&] { return WaitForSingleObject(process.Get(), 0) == WAIT_OBJECT_0; }, 30000);
+    RunProcess(L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" /Quit", 30000);
 }
 
 int RunningDeviceSimServers() {

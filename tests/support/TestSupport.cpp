@@ -43,6 +43,20 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds) {
     }
 }
 
+DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds) {
+    STARTUPINFOW startup = {sizeof startup};
+    PROCESS_INFORMATION process = {};
+    if (!CreateProcessW(nullptr, &commandLine[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
+        return GetLastError();
+    CloseHandle(process.hThread);
+    const bool ended = PumpUntil([&] { return WaitForSingleObject(process.hProcess, 0) == WAIT_OBJECT_0; },
+                                 timeoutMilliseconds);
+    DWORD exitCode = WAIT_TIMEOUT;
+    if (ended) GetExitCodeProcess(process.hProcess, &exitCode);
+    CloseHandle(process.hProcess);
+    return exitCode;
+}
+
 std::wstring TraceLogPath() {
     wchar_t dir[MAX_PATH] = L"";
     GetTempPathW(MAX_PATH, dir);

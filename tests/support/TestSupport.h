@@ -20,6 +20,10 @@ void PumpMessagesFor(DWORD milliseconds);
 // Dispatches messages until done() or the timeout; returns done()'s last answer.
 bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
 
+// Runs a command line to its end, dispatching this thread's messages meanwhile (a server
+// that is quitting may call back into it). The exit code, or the error that stopped it.
+DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000);
+
 std::wstring TraceLogPath();
 // The whole trace file as bytes (readable while the module holds it open).
 std::string ReadTraceLog();

@@ -42,6 +42,10 @@ std::wstring ControlText(HWND dialog, int id) {
 }
 
 INT_PTR CALLBACK NoProc(HWND, UINT, WPARAM, LPARAM) { return FALSE; }
+
+HWND NewParentWindow() {
+    return CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
+}
 }  // namespace
 
 TEST(Resources, StringTable) {
@@ -87,7 +91,7 @@ TEST(Resources, DialogTemplatesHoldTheirControls) {
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
     };
-    HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
+    HWND parent = NewParentWindow();
     for (const auto& c : controls) {
         HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, NoProc, 0);
         ASSERT_NE(nullptr, dialog) << c.dialog;
@@ -107,7 +111,7 @@ TEST(Resources, DialogTemplatesHoldTheirControls) {
 }
 
 TEST(Resources, SearchingClipPlaysInTheAnimationControl) {
-    HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
+    HWND parent = NewParentWindow();
     HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(IDD_FIND), parent, NoProc, 0);
     ASSERT_NE(nullptr, dialog);
     HWND animation = GetDlgItem(dialog, IDC_FIND_ANIMATION);
