@@ -75,12 +75,12 @@ protected:
         g_notified.clear();
         g_viewMessages.clear();
         CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
-        SimReceiverSpec spec;
-        spec.folder = L"Calvex A";
-        spec.serialNumber = L"1000-0001";
-        spec.model = L"Q9 GNSS";
-        spec.portType = 2;
-        tree.AddReceiver(spec);
+        ReceiverSetup setup;
+        setup.folder = L"Calvex A";
+        setup.serialNumber = L"1000-0001";
+        setup.model = L"Q9 GNSS";
+        setup.portType = 2;
+        tree.AddReceiver(setup);
         tree.AddFile(L"Calvex A", L"LOG0001", 100);
         scope.reset(new DeviceSimScope(tree.Root()));
     }
@@ -128,10 +128,10 @@ TEST_F(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
          "CCalvexFilesShellFolderEventHandler::OnFileDeleted\r\n", receiverPath, receiverView},
         {"receiver plugged in",
          [](ReceiverTree& t) {
-             SimReceiverSpec spec;
-             spec.folder = L"Calvex B";
-             spec.serialNumber = L"1000-0002";
-             t.AddReceiver(spec);
+             ReceiverSetup setup;
+             setup.folder = L"Calvex B";
+             setup.serialNumber = L"1000-0002";
+             t.AddReceiver(setup);
          },
          "CCalvexReceiversShellFolderEventHandler::OnReceiverOnline\r\n", kRootPath, rootView},
     };

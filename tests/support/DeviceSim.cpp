@@ -35,13 +35,13 @@ std::wstring SampleReceiversDir() { return SourceDir() + L"\\sample-receivers"; 
 
 ReceiverTree::ReceiverTree() : m_dir(L"receivers") {}
 
-std::wstring ReceiverTree::AddReceiver(const SimReceiverSpec& spec) {
-    std::wstring text = L"[Receiver]\r\nBrand=" + std::to_wstring(spec.brand) + L"\r\nLabel=" + spec.label +
-                        L"\r\nSerialNumber=" + spec.serialNumber + L"\r\nModel=" + spec.model +
-                        L"\r\nPortType=" + std::to_wstring(spec.portType) + L"\r\nPortName=" + spec.portName + L"\r\n";
-    for (const std::wstring& line : spec.extraLines) text += line + L"\r\n";
-    WriteDescription(spec.folder, Narrow(text));
-    return FolderPath(spec.folder);
+std::wstring ReceiverTree::AddReceiver(const ReceiverSetup& setup) {
+    std::wstring text = L"[Receiver]\r\nBrand=" + std::to_wstring(setup.brand) + L"\r\nLabel=" + setup.label +
+                        L"\r\nSerialNumber=" + setup.serialNumber + L"\r\nModel=" + setup.model +
+                        L"\r\nPortType=" + std::to_wstring(setup.portType) + L"\r\nPortName=" + setup.portName + L"\r\n";
+    for (const std::wstring& line : setup.extraLines) text += line + L"\r\n";
+    WriteDescription(setup.folder, Narrow(text));
+    return FolderPath(setup.folder);
 }
 
 void ReceiverTree::WriteDescription(const std::wstring& folder, const std::string& text) {

@@ -20,7 +20,7 @@ namespace testsupport {
 std::wstring SampleReceiversDir();
 
 // The fields of one receiver's description file.
-struct SimReceiverSpec {
+struct ReceiverSetup {
     std::wstring folder;
     long brand = 1;
     std::wstring label = L"Test receiver";
@@ -40,7 +40,7 @@ public:
     std::wstring FolderPath(const std::wstring& folder) const { return Root() + L"\\" + folder; }
 
     // Makes the folder and writes its description file; returns the folder's path.
-    std::wstring AddReceiver(const SimReceiverSpec& spec);
+    std::wstring AddReceiver(const ReceiverSetup& setup);
     // Writes the description file as given (UTF-8), for malformed ones.
     void WriteDescription(const std::wstring& folder, const std::string& text);
     // A file in a receiver's memory; returns its path.

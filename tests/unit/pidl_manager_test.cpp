@@ -12,7 +12,7 @@
 #include "support/TestSupport.h"
 
 namespace {
-struct ItemSpec {
+struct ItemEntry {
     DWORD type;
     const wchar_t* name;
 };
@@ -22,16 +22,16 @@ protected:
     void TearDown() override { EXPECT_EQ(malloc.Outstanding(), 0u) << "a list was leaked"; }
 
     UniquePidl Own(LPITEMIDLIST list) { return UniquePidl(&malloc, list); }
-    UniquePidl Make(const std::vector<ItemSpec>& items) {
+    UniquePidl Make(const std::vector<ItemEntry>& items) {
         UniquePidl list;
-        for (const ItemSpec& spec : items) {
-            UniquePidl item = Own(mgr.Create(spec.type, spec.name));
+        for (const ItemEntry& entry : items) {
+            UniquePidl item = Own(mgr.Create(entry.type, entry.name));
             list = Own(mgr.Concatenate(list.Get(), item.Get()));
         }
         return list;
     }
-    std::vector<ItemSpec> Read(LPCITEMIDLIST list) {
-        std::vector<ItemSpec> items;
+    std::vector<ItemEntry> Read(LPCITEMIDLIST list) {
+        std::vector<ItemEntry> items;
         names.clear();
         for (LPCITEMIDLIST item = list; mgr.GetData(item); item = mgr.GetNextItem(item))
             names.push_back(mgr.GetItemName(item));
@@ -40,8 +40,8 @@ protected:
             items.push_back({mgr.GetData(item)->type, names[i++].c_str()});
         return items;
     }
-    void ExpectItems(LPCITEMIDLIST list, const std::vector<ItemSpec>& expected) {
-        std::vector<ItemSpec> actual = Read(list);
+    void ExpectItems(LPCITEMIDLIST list, const std::vector<ItemEntry>& expected) {
+        std::vector<ItemEntry> actual = Read(list);
         ASSERT_EQ(actual.size(), expected.size());
         for (size_t i = 0; i < expected.size(); ++i) {
             EXPECT_EQ(actual[i].type, expected[i].type) << "item " << i;
@@ -108,7 +108,7 @@ TEST_F(PidlManagerTest, PathsGiveRootReceiverAndFile) {
     const struct {
         const wchar_t* path;
         DWORD brand;
-        std::vector<ItemSpec> items;
+        std::vector<ItemEntry> items;
     } cases[] = {
         {L"\\\\Calvex Receivers//123!Z#5!COM3\\\\", 1, {{1, kRoot}, {3, kKey}}},
         {L"c0/c1/c2/c3/c4", 2, {{2, L"c0"}, {4, L"c1"}, {6, L"c2\\c3\\c4"}}},
@@ -194,7 +194,7 @@ TEST_F(PidlManagerTest, FileFieldsSurviveCopies) {
 
 TEST_F(PidlManagerTest, PathTexts) {
     const struct {
-        std::vector<ItemSpec> items;
+        std::vector<ItemEntry> items;
         bool keepKeys;
         const wchar_t* text;
         UINT result;
