@@ -1,0 +1,102 @@
+#!/usr/bin/env bash
+# explorer_walk_check.sh BUILD_DIR [SHOTS_DIR]: a person's walk through Wine's own Explorer.
+# Opens My Computer, then each brand folder and one of its receivers, by keyboard as a user
+# does (type-ahead and Enter); at each level reads what our view's list control shows
+# (view_probe) and compares it with the namespace as calvex-shell lists it through the shell.
+# Screenshots of each level go to SHOTS_DIR (default BUILD_DIR/shots).
+set -u
+build=$1
+shots=${2:-$build/shots}
+mkdir -p "$shots"
+run="$build/wine-run"
+pass=0 fail=0
+ok() { pass=$((pass + 1)); }
+bad() { fail=$((fail + 1)); echo "FAIL: $*"; }
+
+tree=$("$run" "$build/calvex-shell.exe" tree 2>/dev/null | tr -d '\r')
+probe() { "$run" "$build/view_probe.exe" 2>/dev/null | tr -d '\r'; }
+
+# Waits until the view shows the wanted column titles (Explorer needs a moment per level).
+wait_columns() {
+  local want=$1 i
+  for i in $(seq 1 40); do
+    view=$(probe)
+    grep -qxF "columns: $want" <<<"$view" && return 0
+    sleep 0.5
+  done
+  return 1
+}
+
+# Types a name's first letters into the focused list and opens the item with Enter.
+open_item() {
+  xdotool type --delay 80 "$1"
+  xdotool key Return
+}
+
+# The window Wine's Explorer opens has no frame here: it sits at the top left of the screen.
+click_list() { xdotool mousemove "$1" "$2" click 1; sleep 0.5; }
+
+"$run" explorer >/dev/null 2>&1 &
+explorer=$!
+cleanup() { kill "$explorer" 2>/dev/null; "$run" taskkill /f /im explorer.exe >/dev/null 2>&1; }
+trap cleanup EXIT
+for i in $(seq 1 60); do xdotool search --name '^Desktop$' >/dev/null 2>&1 && break; sleep 0.5; done
+sleep 2
+
+# One brand folder: open it from My Computer, check its receivers, open one, check its files.
+walk_brand() {
+  local brand=$1 root=$2 receiver=$3 shot=$4
+  click_list 400 300
+  open_item "$brand"
+  if ! wait_columns "Name|Serial number|Model|Port"; then
+    bad "$brand: no receivers view"; return
+  fi
+  ok
+  import -window root "$shots/$shot-receivers.png"
+  # Every receiver the shell lists under this root is a row: display name, serial, model, port.
+  local section
+  section=$(sed -n "/$root/,/^::/p" <<<"$tree" | grep '^  \[+\]')
+  while IFS= read -r line; do
+    local display key serial model port
+    display=$(sed 's/^  \[+\] \(.*\)    Calvex Receivers\\.*$/\1/' <<<"$line")
+    key=$(sed 's/^.*Calvex Receivers\\//' <<<"$line")
+    IFS='!' read -r serial model port <<<"$key"
+    model=${model//#//}
+    if grep -qxF "row: $display|$serial|$model|$port" <<<"$view"; then ok; else bad "$brand: no row $display|$serial|$model|$port"; fi
+  done <<<"$section"
+  local rows
+  rows=$(grep -c '^row: ' <<<"$view")
+  [ "$rows" -eq "$(grep -c . <<<"$section")" ] && ok || bad "$brand: $rows rows for $(grep -c . <<<"$section") receivers"
+
+  click_list 400 400
+  open_item "${receiver:0:3}"
+  if ! wait_columns "Name|Size|Time"; then
+    bad "$brand: no files view for $receiver"; return
+  fi
+  ok
+  sleep 1
+  view=$(probe)
+  import -window root "$shots/$shot-files.png"
+  local files
+  files=$(sed -n "/$root/,/^::/p" <<<"$tree" | sed -n "/\[+\] $receiver/,/\[+\]/p" | grep '^     -  ' |
+    sed 's/^     -  \(.*\)    Calvex Receivers\\.*$/\1/')
+  while IFS= read -r name; do
+    [ -z "$name" ] && continue
+    if grep -qE "^row: $(sed 's/[][\.*^$/]/\\&/g' <<<"$name")\|[0-9.]+ (bytes|KB|MB|GB)\|[0-9]" <<<"$view"; then ok
+    else bad "$brand: no row for $name with a size and a time"; fi
+  done <<<"$files"
+  grep -q "Invalid DateTime" <<<"$view" && bad "$brand: a time did not convert" || ok
+  # Back to My Computer: the toolbar's Up button, twice.
+  xdotool mousemove 81 40 click 1; sleep 1.5
+  xdotool mousemove 81 40 click 1; sleep 1.5
+}
+
+click_list 400 300
+open_item "My"
+sleep 2
+walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
+walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
+
+[ $fail -eq 0 ] || { echo "--- the namespace"; echo "$tree"; echo "--- the last view"; echo "$view"; }
+echo "$pass passed, $fail failed"
+[ $fail -eq 0 ]
