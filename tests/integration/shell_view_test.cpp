@@ -6,7 +6,10 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <functional>
 #include <memory>
+#include <thread>
 #include <string>
 #include <vector>
 
@@ -187,6 +190,39 @@ size_t CountTrace(const std::string& line) {
     size_t count = 0;
     for (const std::string& message : TraceMessages()) count += message == line;
     return count;
+}
+
+
+// Runs action on this thread while another thread reads and closes every dialog titled
+// title that it opens (a message box or the properties sheet); returns what was read.
+std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
+                                            const std::function<std::wstring(HWND)>& read) {
+    std::vector<std::wstring> seen;
+    std::atomic<bool> done(false);
+    std::thread closer([&] {
+        HWND last = nullptr;
+        while (!done) {
+            HWND dialog = FindWindowW(L"#32770", title);
+            if (dialog && dialog != last && IsWindowVisible(dialog)) {
+                Sleep(200);  // let it finish initialising
+                seen.push_back(read(dialog));
+                last = dialog;
+                PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
+                PostMessageW(dialog, WM_COMMAND, IDOK, 0);
+            }
+            Sleep(50);
+        }
+    });
+    action();
+    done = true;
+    closer.join();
+    return seen;
+}
+
+std::wstring ChildText(HWND parent, int id) {
+    wchar_t text[260] = L"";
+    GetWindowTextW(GetDlgItem(parent, id), text, 260);
+    return text;
 }
 
 class ShellViewTest : public testing::Test {
@@ -447,4 +483,72 @@ TEST_F(ShellViewTest, ManyViewsLeaveNoWindowGdiObjectOrLockBehind) {
     EXPECT_EQ(nullptr, FindWindowExW(browser.m_frame, nullptr, L"CalvexReceiversViewNSClass", nullptr));
     EXPECT_LE(GetGuiResources(GetCurrentProcess(), GR_GDIOBJECTS), gdi + 5);
     EXPECT_EQ(locks, ModuleLock::Count());
+}
+
+TEST_F(ShellViewTest, RefusedDeleteShowsOneBoxPerFileAndGoesOn) {
+    SetDeviceSimCallFailure(L"IReceiverFile.Delete", E_ACCESSDENIED);
+    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
+    TestBrowser browser(false);
+    HostedView host(receiver.Get(), browser);
+    ASSERT_EQ(3, host.Count());
+    host.Select(0);
+    host.Select(2);
+    const size_t before = CountTrace("CCalvexReceiversShellView::Refresh\r\n");
+    std::vector<std::wstring> boxes = WithDialogsClosed(
+        L"Delete", [&] { host.Object()->OnCommand(1288); }, [](HWND box) { return ChildText(box, 0xFFFF); });
+    ASSERT_EQ(2u, boxes.size());
+    EXPECT_FALSE(boxes[0].empty());  // the system's text for the refusal
+    EXPECT_EQ(before + 2, CountTrace("CCalvexReceiversShellView::Refresh\r\n"));
+    EXPECT_EQ(3, host.Count());
+}
+
+TEST_F(ShellViewTest, PropertiesOpenOneSheetWithTheReceiversTexts) {
+    ComPtr<IShellFolder> root = RootFolder();
+    TestBrowser browser(false);
+    HostedView host(root.Get(), browser);
+    host.Select(0);
+    std::vector<std::wstring> sheets = WithDialogsClosed(
+        L"Properties", [&] { host.Object()->OnCommand(1287); },
+        [](HWND sheet) {
+            HWND tabs = reinterpret_cast<HWND>(SendMessageW(sheet, PSM_GETTABCONTROL, 0, 0));
+            wchar_t tab[64] = L"";
+            TCITEMW item = {TCIF_TEXT};
+            item.pszText = tab;
+            item.cchTextMax = 64;
+            SendMessageW(tabs, TCM_GETITEMW, 0, reinterpret_cast<LPARAM>(&item));
+            HWND page = reinterpret_cast<HWND>(SendMessageW(sheet, PSM_GETCURRENTPAGEHWND, 0, 0));
+            std::wstring texts = tab;
+            const int ids[] = {1015, 261, 1016, 262, 1017, 263, 1018, 264};
+            for (int id : ids) texts += L"|" + ChildText(page, id);
+            return texts;
+        });
+    ASSERT_EQ(1u, sheets.size());
+    EXPECT_EQ(L"General|Name|Q9 GNSS@USB|Model|Q9 GNSS|Serial number|1000-0001|Port|USB", sheets[0]);
+}
+
+TEST_F(ShellViewTest, FailingDeviceManagerLeavesTheViewUsable) {
+    struct Case {
+        const wchar_t* call;
+        bool filesLevel;
+        const char* trace;
+    } cases[] = {
+        {L"IDeviceMgr.get_Receivers", false, "CCalvexReceiversShellView::OnEnumIdList - OK\r\n"},
+        {L"IReceiver.get_Files", true, "CCalvexReceiversShellView::Refresh - get files is failed [0x80004005]\r\n"},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(Narrow(c.call));
+        DeviceSimScope faults(tree.Root());
+        SetDeviceSimCallFailure(c.call, E_FAIL);
+        ComPtr<IShellFolder> root = RootFolder();
+        ComPtr<IShellFolder> folder = c.filesLevel ? FirstReceiver(root.Get()) : root;
+        ASSERT_TRUE(folder);
+        TestBrowser browser(false);
+        HostedView host(folder.Get(), browser);
+        const size_t before = CountTrace(c.trace);
+        EXPECT_EQ(S_OK, host.view->Refresh());
+        EXPECT_EQ(before + 1, CountTrace(c.trace));
+        EXPECT_EQ(0, host.Count());
+        host.Object()->OnCommand(1286);
+        EXPECT_TRUE(IsWindow(host.list));
+    }
 }
