@@ -552,3 +552,44 @@ TEST_F(ShellViewTest, FailingDeviceManagerLeavesTheViewUsable) {
         EXPECT_TRUE(IsWindow(host.list));
     }
 }
+
+TEST_F(ShellViewTest, SearchingDialogCentresItsTextAndGoesWithTheNextFill) {
+    ComPtr<IShellFolder> root = RootFolder();
+    TestBrowser browser(false);
+    HostedView host(root.Get(), browser);
+    host.Object()->OnCommand(100);
+    HWND dialog = FindWindowExW(host.list, nullptr, L"#32770", nullptr);
+    ASSERT_TRUE(dialog && IsWindowVisible(dialog));
+    EXPECT_EQ(L"Detecting receivers...", ChildText(dialog, 251));
+    EXPECT_EQ(L"Cancel", ChildText(dialog, IDCANCEL));
+    SendMessageW(dialog, WM_SIZE, 0, MAKELPARAM(400, 300));
+    RECT text;
+    GetWindowRect(GetDlgItem(dialog, 251), &text);
+    MapWindowPoints(nullptr, dialog, reinterpret_cast<POINT*>(&text), 2);
+    EXPECT_NEAR(200, (text.left + text.right) / 2, 1);
+    EXPECT_NEAR(150, (text.top + text.bottom) / 2, 1);
+    SendMessageW(host.window, ViewNotificationMessage(), 0, 0);
+    EXPECT_FALSE(IsWindow(dialog));
+}
+
+TEST_F(ShellViewTest, UnreachableDeviceManagerMakesRefreshAnswerFalse) {
+    ComPtr<IShellFolder> root = RootFolder();
+    TestBrowser browser(false);
+    HostedView host(root.Get(), browser);
+    const int items = host.Count();
+    StopDeviceSimServers();
+    // The class's server points nowhere for the length of the test.
+    const wchar_t key[] = L"CLSID\\{0FADF314-B4FD-413C-9E26-6BC49B066080}\\LocalServer32";
+    wchar_t saved[MAX_PATH] = L"";
+    DWORD size = sizeof(saved);
+    ASSERT_EQ(ERROR_SUCCESS, RegGetValueW(HKEY_CLASSES_ROOT, key, nullptr, RRF_RT_REG_SZ, nullptr, saved, &size));
+    const wchar_t missing[] = L"C:\\missing\\CalvexDeviceSim.exe";
+    RegSetKeyValueW(HKEY_CLASSES_ROOT, key, nullptr, REG_SZ, missing, sizeof(missing));
+    const char line[] = "CCalvexReceiversShellView::Refresh - access to receiver manager is failed [0x";
+    const size_t traced = ReadTraceLog().size();
+    const HRESULT refreshed = host.view->Refresh();
+    RegSetKeyValueW(HKEY_CLASSES_ROOT, key, nullptr, REG_SZ, saved, static_cast<DWORD>((wcslen(saved) + 1) * 2));
+    EXPECT_EQ(S_FALSE, refreshed);
+    EXPECT_NE(std::string::npos, ReadTraceLog().find(line, traced));
+    EXPECT_EQ(items, host.Count());
+}
