@@ -18,6 +18,7 @@
 #include "trace/TraceLog.h"
 #include "transfer/CCalvexReceiversContextMenu.h"
 #include "view/CCalvexReceiversQueryInfo.h"
+#include "view/CCalvexReceiversShellView.h"
 
 namespace {
 const wchar_t kComputerParsingName[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}";
@@ -274,14 +275,25 @@ STDMETHODIMP IReceiversShellFolderImpl::CreateViewObject(HWND hwndOwner, REFIID 
     if (IsEqualIID(riid, IID_IShellView)) {
         HRESULT hr = InitCollections();
         if (FAILED(hr)) return hr;
-        // The folder's own view is not part of the module yet: no view to give.
-        return E_NOINTERFACE;
+        return CreateView(riid, ppv);
     }
     if (IsEqualIID(riid, IID_IContextMenu)) {
         InitCollections();  // the menu needs nothing of it
         return CreateComInstance<CCalvexReceiversContextMenu>(nullptr, riid, ppv);
     }
     return E_NOINTERFACE;
+}
+
+HRESULT IReceiversShellFolderImpl::CreateView(REFIID riid, void** ppv) {
+    ComObject<CCalvexReceiversShellView>* view = nullptr;
+    HRESULT hr = CreateComObject<CCalvexReceiversShellView>(&view);
+    if (FAILED(hr)) return hr;
+    // The view reads its level from the whole list: root, then the receiver if any.
+    UniquePidl absolute(*m_pidlMgr, m_pidlMgr->CreateFromPath(FolderPath(false).c_str(), m_brandKind));
+    hr = view->Init(this, absolute.Get());
+    if (SUCCEEDED(hr)) hr = view->QueryInterface(riid, ppv);
+    view->Release();
+    return hr;
 }
 
 STDMETHODIMP IReceiversShellFolderImpl::GetAttributesOf(UINT cidl, PCUITEMID_CHILD_ARRAY apidl, SFGAOF* rgfInOut) {

@@ -97,6 +97,7 @@ private:
     HRESULT InitRootCollections();
     HRESULT InitReceiverCollections();
     HRESULT BindSubFolder(LPCITEMIDLIST pidl, REFIID riid, void** ppv);
+    HRESULT CreateView(REFIID riid, void** ppv);
     HRESULT CreateItemObject(LPCITEMIDLIST item, REFIID riid, void** ppv);
     HRESULT DisplayName(LPCITEMIDLIST pidl, SHGDNF flags, std::wstring& name) const;
     static HRESULT PostPathToNotifyWindow(const std::wstring& path);

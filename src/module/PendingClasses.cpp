@@ -12,5 +12,4 @@ public:
 };
 }  // namespace
 
-HRESULT CreateCalvexReceiversShellView(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }
 HRESULT CreateCalvexReceiversDataObject(IUnknown* o, REFIID r, void** p) { return CreateComInstance<PendingObject>(o, r, p); }

@@ -1,0 +1,234 @@
+// The view's commands (one dispatcher for menus, the right-click menu and Exec), its
+// IOleCommandTarget and the re-reading of its level from the device manager.
+#include <windows.h>
+#include <commctrl.h>
+#include <shlobj.h>
+
+#include <string>
+#include <vector>
+
+#include "CalvexDeviceMgrLib.h"
+#include "com/Bstr.h"
+#include "module/ModuleState.h"
+#include "resource.h"
+#include "trace/TraceLog.h"
+#include "transfer/CCalvexReceiversDataObject.h"
+#include "view/CCalvexReceiversShellView.h"
+#include "view/CRcvDlg.h"
+#include "view/ViewCommands.h"
+
+namespace {
+// {E102076F-4057-4E7F-8209-511258F12B62}, the Calvex folder class, answered like the standard group.
+const GUID kCalvexFolderGroup = {0xE102076F, 0x4057, 0x4E7F, {0x82, 0x09, 0x51, 0x12, 0x58, 0xF1, 0x2B, 0x62}};
+
+std::string GroupText(const GUID* group) {
+    if (!group) return std::string();
+    wchar_t wide[64] = L"";
+    StringFromGUID2(*group, wide, 64);
+    char narrow[64] = "";
+    WideCharToMultiByte(CP_ACP, 0, wide, -1, narrow, sizeof(narrow), nullptr, nullptr);
+    return narrow;
+}
+
+bool IsAcceptedGroup(const GUID* group) {
+    return !group || IsEqualGUID(*group, kCalvexFolderGroup) || IsEqualGUID(*group, CGID_Explorer) ||
+           IsEqualGUID(*group, CGID_ShellDocView);
+}
+
+std::vector<std::wstring> SplitKey(const std::wstring& key) {
+    std::vector<std::wstring> fields(1);
+    for (wchar_t c : key) {
+        if (c == L'!') fields.emplace_back();
+        else fields.back() += c;
+    }
+    return fields;
+}
+
+void ShowDeleteError(HWND owner, HRESULT result) {
+    wchar_t* system = nullptr;
+    FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_FROM_SYSTEM | FORMAT_MESSAGE_IGNORE_INSERTS,
+                   nullptr, static_cast<DWORD>(result), 0, reinterpret_cast<LPWSTR>(&system), 0, nullptr);
+    wchar_t fallback[64];
+    wsprintfW(fallback, L"Error 0x%08X", static_cast<unsigned>(result));
+    MessageBoxW(owner, system ? system : fallback, LoadModuleString(IDS_MENU_DELETE).c_str(), MB_OK | MB_ICONERROR);
+    if (system) LocalFree(system);
+}
+}  // namespace
+
+void CCalvexReceiversShellView::OnCommand(UINT id) {
+    TraceA("CCalvexReceiversShellView::OnCommand %u\n", id);
+    switch (id) {
+    case ViewCommandRefresh: Refresh(); break;
+    case ViewCommandFind: ShowFindAnimation(); break;
+    case ViewCommandCopy: OnCopy(); break;
+    case ViewCommandLargeIcons:
+    case ViewCommandSmallIcons:
+    case ViewCommandList:
+    case ViewCommandDetails: SwitchMode(id); break;
+    case ViewCommandProperties: OnProperties(); break;
+    case ViewCommandDelete: OnDelete(); break;
+    case ViewCommandOpen: OnOpen(); break;
+    default:
+        if (id >= ViewCommandFirstItemWalk) ReadSelectedItems();
+        break;
+    }
+}
+
+int CCalvexReceiversShellView::FirstSelected() const {
+    if (!m_listWindow) return -1;
+    return static_cast<int>(SendMessageW(m_listWindow, LVM_GETNEXTITEM, static_cast<WPARAM>(-1), LVNI_SELECTED));
+}
+
+bool CCalvexReceiversShellView::HasSelection() const { return FirstSelected() >= 0; }
+
+LPCITEMIDLIST CCalvexReceiversShellView::ItemAt(int index) const {
+    LVITEMW item = {};
+    item.mask = LVIF_PARAM;
+    item.iItem = index;
+    if (!SendMessageW(m_listWindow, LVM_GETITEMW, 0, reinterpret_cast<LPARAM>(&item))) return nullptr;
+    return reinterpret_cast<LPCITEMIDLIST>(item.lParam);
+}
+
+void CCalvexReceiversShellView::ReadSelectedItems() {
+    for (int i = FirstSelected(); i >= 0; i = static_cast<int>(SendMessageW(m_listWindow, LVM_GETNEXTITEM, i, LVNI_SELECTED)))
+        m_pidlManager->GetData(ItemAt(i));
+}
+
+void CCalvexReceiversShellView::OnOpen() {
+    const int index = FirstSelected();
+    if (index < 0 || !m_shellBrowser) return;
+    HRESULT hr = m_shellBrowser->BrowseObject(ItemAt(index), SBSP_RELATIVE);
+    if (FAILED(hr) && m_commDlgBrowser) m_commDlgBrowser->OnDefaultCommand(this);
+}
+
+HRESULT CCalvexReceiversShellView::MakeDataObject(IDataObject** out) {
+    *out = nullptr;
+    ComObject<CCalvexReceiversDataObject>* object = nullptr;
+    HRESULT hr = CreateComObject<CCalvexReceiversDataObject>(&object);
+    if (FAILED(hr)) return hr;
+    ComPtr<IDataObject> data;
+    data.Attach(object);
+    const std::wstring path = m_folder ? m_folder->FolderPath(false) : std::wstring();
+    const DWORD brand = m_folder ? m_folder->BrandKind() : BrandCalvex;
+    for (int i = FirstSelected(); i >= 0; i = static_cast<int>(SendMessageW(m_listWindow, LVM_GETNEXTITEM, i, LVNI_SELECTED))) {
+        LPCITEMIDLIST item = ItemAt(i);
+        if (!m_pidlManager->GetData(item)) return E_INVALIDARG;
+        UniquePidl folder(*m_pidlManager, m_pidlManager->CreateFromPath(path.c_str(), brand));
+        UniquePidl absolute(*m_pidlManager, m_pidlManager->Concatenate(folder.Get(), item));
+        object->AddPidl(absolute.Get(), m_folder ? m_folder->EventSourceCollection() : nullptr);
+    }
+    *out = data.Detach();
+    return S_OK;
+}
+
+void CCalvexReceiversShellView::OnCopy() {
+    if (!IsReceiverType(FolderType()) || !HasSelection()) return;
+    ComPtr<IDataObject> data;
+    if (SUCCEEDED(MakeDataObject(&data))) OleSetClipboard(data.Get());
+}
+
+void CCalvexReceiversShellView::OnDelete() {
+    if (!IsReceiverType(FolderType()) || !HasSelection() || !m_folder) return;
+    // Each delete refreshes the list, so the selection is taken before the first one.
+    std::vector<UniquePidl> selected;
+    for (int i = FirstSelected(); i >= 0; i = static_cast<int>(SendMessageW(m_listWindow, LVM_GETNEXTITEM, i, LVNI_SELECTED)))
+        selected.emplace_back(*m_pidlManager, m_pidlManager->Copy(ItemAt(i)));
+    for (const UniquePidl& item : selected) {
+        const ReceiverItemData* data = m_pidlManager->GetData(item.Get());
+        if (!data || !IsFileType(data->type)) continue;
+        wchar_t name[kPathCapacity] = L"";
+        m_pidlManager->GetPath(item.Get(), name, kPathCapacity, true);
+        std::wstring fileName = name;
+        const size_t dot = fileName.rfind(L'.');
+        // The receiver knows its files without ".qpr".
+        if (dot != std::wstring::npos && _wcsicmp(fileName.c_str() + dot, L".qpr") == 0) fileName.resize(dot);
+        ComPtr<IFilesColl> files;
+        ComPtr<IDispatch> found;
+        ComPtr<IReceiverFile> file;
+        if (!m_folder->EventSourceCollection() ||
+            FAILED(m_folder->EventSourceCollection()->QueryInterface(IID_IFilesColl, files.PutVoid())))
+            continue;
+        Bstr key(fileName);
+        if (FAILED(files->get_ItemByName(key.Get(), &found)) || !found ||
+            FAILED(found.QueryTo(IID_IReceiverFile, file.PutVoid())))
+            continue;
+        HRESULT hr = file->Delete();
+        if (hr != 0) ShowDeleteError(m_listWindow, hr);
+        Refresh();
+    }
+}
+
+void CCalvexReceiversShellView::OnProperties() {
+    const int index = FirstSelected();
+    if (index < 0) return;
+    LPCITEMIDLIST item = ItemAt(index);
+    const ReceiverItemData* data = m_pidlManager->GetData(item);
+    if (!data || !IsReceiverType(data->type)) return;
+    CRcvDlg sheet(m_viewWindow, item);
+    sheet.DoModal();
+}
+
+STDMETHODIMP CCalvexReceiversShellView::Refresh() {
+    TraceA("CCalvexReceiversShellView::Refresh\r\n");
+    ComPtr<IDeviceMgr> manager;
+    HRESULT hr = CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, manager.PutVoid());
+    if (FAILED(hr) || !manager) {
+        TraceA("CCalvexReceiversShellView::Refresh - access to receiver manager is failed [0x%08X]\r\n",
+               static_cast<unsigned>(hr));
+        return S_FALSE;
+    }
+    if (!m_folder || !m_pidlManager || !IsReceiverType(FolderType())) {
+        manager->Refresh();
+        FillList();
+        return S_OK;
+    }
+    hr = RefreshFiles(manager.Get());
+    if (FAILED(hr)) {
+        TraceA("CCalvexReceiversShellView::Refresh - get files is failed [0x%08X]\r\n", static_cast<unsigned>(hr));
+        return S_OK;
+    }
+    FillList();
+    return S_OK;
+}
+
+HRESULT CCalvexReceiversShellView::RefreshFiles(IDeviceMgr* manager) {
+    ComPtr<IDispatch> receivers;
+    ComPtr<IReceiversColl> collection;
+    HRESULT hr = manager->get_Receivers(&receivers);
+    if (SUCCEEDED(hr)) hr = receivers ? receivers.QueryTo(IID_IReceiversColl, collection.PutVoid()) : E_POINTER;
+    const std::vector<std::wstring> fields =
+        SplitKey(m_pidlManager->GetItemName(m_pidlManager->GetLastItem(m_folderPidl.Get())));
+    const std::wstring lookup = fields.size() == 3 ? fields[2] + L"-" + fields[0] : std::wstring();
+    TraceW(L"CCalvexReceiversShellView::Refresh - get files on receiver [%s]\r\n", lookup.c_str());
+    if (FAILED(hr)) return hr;
+    Bstr key(lookup);
+    ComPtr<IDispatch> item;
+    ComPtr<IReceiver> receiver;
+    ComPtr<IDispatch> files;
+    hr = collection->get_ItemByKey(key.Get(), &item);
+    if (SUCCEEDED(hr)) hr = item ? item.QueryTo(IID_IReceiver, receiver.PutVoid()) : E_POINTER;
+    if (SUCCEEDED(hr)) hr = receiver->get_Files(&files);
+    return hr;
+}
+
+STDMETHODIMP CCalvexReceiversShellView::QueryStatus(const GUID* group, ULONG count, OLECMD* commands, OLECMDTEXT*) {
+    TraceA("CCalvexReceiversShellView::QueryStatus, pguidCmdGroup = %s\r\n", GroupText(group).c_str());
+    if (!IsAcceptedGroup(group)) return OLECMDERR_E_UNKNOWNGROUP;
+    if (!commands) return E_POINTER;
+    for (ULONG i = 0; i < count; ++i) {
+        TraceA("CCalvexReceiversShellView::QueryStatus CMDID=%d\n", static_cast<int>(commands[i].cmdID));
+        const ULONG id = commands[i].cmdID;
+        commands[i].cmdf = id == OLECMDID_PROPERTIES || id == OLECMDID_COPY || id == OLECMDID_REFRESH
+                               ? OLECMDF_SUPPORTED | OLECMDF_ENABLED
+                               : 0;
+    }
+    return S_OK;
+}
+
+STDMETHODIMP CCalvexReceiversShellView::Exec(const GUID* group, DWORD id, DWORD option, VARIANT*, VARIANT*) {
+    TraceA("CCalvexReceiversShellView::Exec, pguidCmdGroup=%s, nCmdID=%d nCmdExecOpt=%d\r\n", GroupText(group).c_str(),
+           static_cast<int>(id), static_cast<int>(option));
+    // Every group is executed, the unknown ones too: that is what callers have always seen.
+    OnCommand(id);
+    return S_OK;
+}
