@@ -127,10 +127,10 @@ INT_PTR CProgressDialogMFC::HandleMessage(UINT message, WPARAM wParam, LPARAM) {
 
 BOOL CProgressDialogMFC::OnInitDialog() {
     TraceA("CProgressDialogMFC::OnInitDialog\r\n");
-    HICON small = static_cast<HICON>(LoadImageW(ResourceInstance(), MAKEINTRESOURCEW(IDI_FILE), IMAGE_ICON,
-                                                GetSystemMetrics(SM_CXSMICON), GetSystemMetrics(SM_CYSMICON), 0));
+    m_smallIcon.Reset(static_cast<HICON>(LoadImageW(ResourceInstance(), MAKEINTRESOURCEW(IDI_FILE), IMAGE_ICON,
+                                                    GetSystemMetrics(SM_CXSMICON), GetSystemMetrics(SM_CYSMICON), 0)));
     UniqueIcon replaced(reinterpret_cast<HICON>(
-        SendMessageW(m_window, WM_SETICON, ICON_SMALL, reinterpret_cast<LPARAM>(small))));
+        SendMessageW(m_window, WM_SETICON, ICON_SMALL, reinterpret_cast<LPARAM>(m_smallIcon.Get()))));
     PostMessageW(m_window, WM_COMMAND, StartCommand, 0);
     SendDlgItemMessageW(m_window, IDC_PROGRESS_BAR, PBM_SETRANGE32, 0, 100);
     SetWindowTextW(m_window, LoadModuleString(IDS_FILE_DOWNLOAD).c_str());

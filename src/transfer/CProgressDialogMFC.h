@@ -9,6 +9,7 @@
 
 #include "CalvexDeviceMgrLib.h"
 #include "com/ComPtr.h"
+#include "com/Handles.h"
 
 class CProgressDialogMFC {
 public:
@@ -46,6 +47,7 @@ private:
 
     HWND m_parent;
     HWND m_window = nullptr;
+    UniqueIcon m_smallIcon;  // outlives the window that shows it
     std::wstring m_itemPath;
     ComPtr<IStream> m_stream;
     ComPtr<IDispatch> m_file;

@@ -137,6 +137,10 @@ protected:
         tree.AddFile(L"Calvex C", L"FAILS", 200000);
         AddReceiver(L"Calvex D", L"1000-0004", {L"[Transfer]", L"Rate=50000", L"ExitAtPercent=50"});
         tree.AddFile(L"Calvex D", L"DIES", 200000);
+        AddReceiver(L"Calvex E", L"1000-0005", {L"[Fail]", L"IReceiverFile.Download=0x80070005"});
+        tree.AddFile(L"Calvex E", L"REFUSED", 1000);
+        AddReceiver(L"Calvex F", L"1000-0006", {L"[Transfer]", L"Rate=100000", L"FailAtPercent=50", L"FailResult=1"});
+        tree.AddFile(L"Calvex F", L"ODD", 200000);
         scope.reset(new DeviceSimScope(tree.Root()));
         timer = SetTimer(nullptr, 0, 40, WatchDialog);
     }
@@ -254,6 +258,7 @@ TEST_F(TransferPasteTest, CopyPasteDeliversFilesByteIdenticalWithTheirTimes) {
     EXPECT_EQ(6u << 20, ReadFileBytes(target.Path() + L"\\BIG.qpr").size());
 }
 
+// Three seconds at this rate: the dialog's liveness check runs and must leave a living server alone.
 TEST_F(TransferPasteTest, SlowReceiverShowsRisingPercentagesAndEnterDoesNotClose) {
     Select(L"1000-0002", {L"SLOW.qpr"});
     const ToolRun run = PasteThroughClipboard();
@@ -274,10 +279,14 @@ TEST_F(TransferPasteTest, OutcomesThatLeaveNoFile) {
         const wchar_t* serial;
         const wchar_t* file;
         bool cancel;
+        int boxes;
+        bool progress;
         const char* traceLine;
     } cases[] = {
-        {"cancel", L"1000-0002", L"SLOW.qpr", true, "CProgressDialogMFC::OnCancel\r\n"},
-        {"fails at 50%", L"1000-0003", L"FAILS.qpr", false, "CProgressDialogMFC::OnFileFinish\n"},
+        {"cancel", L"1000-0002", L"SLOW.qpr", true, 1, true, "CProgressDialogMFC::OnCancel\r\n"},
+        {"fails at 50%", L"1000-0003", L"FAILS.qpr", false, 1, true, "CProgressDialogMFC::OnFileFinish\n"},
+        {"start refused", L"1000-0005", L"REFUSED.qpr", false, 1, false, "CProgressDialogMFC::StartFileDownload\r\n"},
+        {"finish with S_FALSE is silent", L"1000-0006", L"ODD.qpr", false, 0, true, "CProgressDialogMFC::OnFileFinish\n"},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
@@ -288,7 +297,8 @@ TEST_F(TransferPasteTest, OutcomesThatLeaveNoFile) {
         const DWORD started = GetTickCount();
         const ToolRun run = PasteThroughClipboard();
         EXPECT_EQ(1u, run.exitCode) << run.output;
-        EXPECT_EQ(1, run.Count("message box:")) << run.output;
+        EXPECT_EQ(c.boxes, run.Count("message box:")) << run.output;
+        EXPECT_EQ(c.progress, !g_watch.positions.empty() && g_watch.positions.back() > 0);
         EXPECT_EQ(1, run.Count("no contents (0x00000001)")) << "FileContents gave S_FALSE\n" << run.output;
         EXPECT_TRUE(TargetIsEmpty());
         EXPECT_TRUE(TraceContains(c.traceLine));
