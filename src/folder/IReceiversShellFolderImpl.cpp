@@ -17,6 +17,7 @@
 #include "module/ModuleState.h"
 #include "trace/TraceLog.h"
 #include "transfer/CCalvexReceiversContextMenu.h"
+#include "transfer/CCalvexReceiversDataObject.h"
 #include "view/CCalvexReceiversQueryInfo.h"
 #include "view/CCalvexReceiversShellView.h"
 
@@ -322,8 +323,6 @@ STDMETHODIMP IReceiversShellFolderImpl::GetUIObjectOf(HWND, UINT cidl, PCUITEMID
     if (IsEqualIID(riid, IID_IDataObject)) {
         HRESULT hr = InitCollections();
         if (FAILED(hr)) return hr;
-        // The data object is not part of the module yet: nothing to copy or drag with.
-        return E_NOINTERFACE;
     }
     UniquePidl folder(*m_pidlMgr, m_pidlMgr->CreateFromPath(FolderPath(false).c_str(), m_brandKind));
     UniquePidl item(*m_pidlMgr, m_pidlMgr->Concatenate(folder.Get(), apidl[0]));
@@ -336,6 +335,10 @@ HRESULT IReceiversShellFolderImpl::CreateItemObject(LPCITEMIDLIST item, REFIID r
         return CreateInitialized<CCalvexReceiversExtractIcon>(riid, ppv, [&](auto* icon) { return icon->SetItem(item); });
     if (IsEqualIID(riid, IID_IQueryInfo))
         return CreateInitialized<CCalvexReceiversQueryInfo>(riid, ppv, [&](auto* info) { return info->SetItem(item); });
+    if (IsEqualIID(riid, IID_IDataObject)) {
+        return CreateInitialized<CCalvexReceiversDataObject>(
+            riid, ppv, [&](auto* data) { return data->AddPidl(item, EventSourceCollection()); });
+    }
     // The context menu knows nothing of the items: the list is built but not handed over.
     return CreateComInstance<CCalvexReceiversContextMenu>(nullptr, riid, ppv);
 }

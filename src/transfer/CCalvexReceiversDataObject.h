@@ -7,6 +7,7 @@
 #include <commctrl.h>
 #include <shlobj.h>
 
+#include <string>
 #include <vector>
 
 #include "com/ComObject.h"
@@ -53,6 +54,15 @@ private:
         UniquePidl pidl;
         ComPtr<IUnknown> device;
     };
+
+    HRESULT GetPreferredDropEffect(STGMEDIUM* medium) const;
+    HRESULT GetFileDescriptors(STGMEDIUM* medium) const;
+    void FillDescriptor(LPCITEMIDLIST pidl, FILEDESCRIPTORW& descriptor) const;
+    HRESULT GetFileContents(LONG index, STGMEDIUM* medium) const;
+    HRESULT GetIdListArray(STGMEDIUM* medium) const;
+    UINT LastItemSize(LPCITEMIDLIST pidl) const;
+    std::wstring RawPath(LPCITEMIDLIST pidl) const;
+    void MoveDragImage() const;
 
     CReceiversPidlMgr m_pidlMgr;
     std::vector<Entry> m_items;

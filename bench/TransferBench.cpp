@@ -1,0 +1,178 @@
+// calvex_transfer_bench: one large file through "FileContents" (the folder's data object, the
+// download dialog and all) against the floor of the same run: a raw download of the same
+// bytes from the simulator into an HGLOBAL stream through the contract, without the dialog.
+//
+//   calvex_transfer_bench.exe [MIB]     (default 64)
+#include <windows.h>
+#include <psapi.h>
+#include <shlobj.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "CalvexDeviceMgrLib.h"
+#include "SimServerProcess.h"
+#include "com/Bstr.h"
+#include "com/ComPtr.h"
+#include "com/DispEventSink.h"
+#include "module/ClassCreators.h"
+#include "module/ModuleApp.h"
+
+namespace {
+const wchar_t kSerial[] = L"9000-0001";
+
+// Ends the raw download's wait on the finish event.
+class FinishSink : public DispEventSinkImpl<FinishSink> {
+public:
+    FinishSink() : DispEventSinkImpl<FinishSink>(DIID__IReceiverFileEvents, LIBID_CalvexDeviceMgrLib, 1, 0) {}
+    static const SinkEntry* SinkMap() {
+        static const SinkEntry map[] = {{3, &FinishSink::OnFinish}, {0, nullptr}};
+        return map;
+    }
+    bool finished = false;
+    LONG result = E_PENDING;
+
+private:
+    void OnFinish(const VARIANT* args, UINT count) {
+        finished = true;
+        if (count >= 2) result = args[1].lVal;
+    }
+};
+
+void Pump() {
+    MSG message;
+    MsgWaitForMultipleObjects(0, nullptr, FALSE, 20, QS_ALLINPUT);
+    while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) DispatchMessageW(&message);
+}
+
+double Seconds(LARGE_INTEGER from) {
+    LARGE_INTEGER now, frequency;
+    QueryPerformanceCounter(&now);
+    QueryPerformanceFrequency(&frequency);
+    return double(now.QuadPart - from.QuadPart) / double(frequency.QuadPart);
+}
+
+double PeakMiB() {
+    PROCESS_MEMORY_COUNTERS counters = {sizeof(counters)};
+    GetProcessMemoryInfo(GetCurrentProcess(), &counters, sizeof(counters));
+    return counters.PeakWorkingSetSize / 1048576.0;
+}
+
+ULONGLONG StreamSize(IStream* stream) {
+    STATSTG stat = {};
+    return stream && SUCCEEDED(stream->Stat(&stat, STATFLAG_NONAME)) ? stat.cbSize.QuadPart : 0;
+}
+
+std::wstring MakeTree(size_t bytes) {
+    wchar_t temp[MAX_PATH];
+    GetTempPathW(MAX_PATH, temp);
+    const std::wstring root = std::wstring(temp) + L"calvex-transfer-bench";
+    const std::wstring folder = root + L"\\Calvex A";
+    CreateDirectoryW(root.c_str(), nullptr);
+    CreateDirectoryW(folder.c_str(), nullptr);
+    const std::string ini = "[Receiver]\r\nBrand=1\r\nLabel=Bench\r\nSerialNumber=9000-0001\r\nModel=Q9\r\nPortType=2\r\n";
+    std::vector<char> data(bytes);
+    for (size_t i = 0; i < bytes; ++i) data[i] = static_cast<char>((i * 2654435761u) >> 13);
+    for (const auto& file : {std::make_pair(folder + L"\\receiver.ini", std::string(ini)),
+                             std::make_pair(folder + L"\\BIG", std::string(data.begin(), data.end()))}) {
+        UniqueFile out(CreateFileW(file.first.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
+        DWORD written = 0;
+        WriteFile(out.Get(), file.second.data(), static_cast<DWORD>(file.second.size()), &written, nullptr);
+    }
+    return root;
+}
+
+// The floor: the contract's calls, a memory stream, the finish event; no dialog, no folder.
+ULONGLONG RawDownload() {
+    ComPtr<IDeviceMgr> manager;
+    CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, manager.PutVoid());
+    ComPtr<IDispatch> receiversDispatch, receiverDispatch, filesDispatch, fileDispatch;
+    if (!manager || FAILED(manager->get_Receivers(&receiversDispatch))) return 0;
+    ComPtr<IReceiversColl> receivers;
+    receiversDispatch.QueryTo(IID_IReceiversColl, receivers.PutVoid());
+    Bstr key(std::wstring(L"USB-") + kSerial);
+    ComPtr<IReceiver> receiver;
+    if (!receivers || FAILED(receivers->get_ItemByKey(key.Get(), &receiverDispatch))) return 0;
+    receiverDispatch.QueryTo(IID_IReceiver, receiver.PutVoid());
+    ComPtr<IFilesColl> files;
+    if (!receiver || FAILED(receiver->get_Files(&filesDispatch))) return 0;
+    filesDispatch.QueryTo(IID_IFilesColl, files.PutVoid());
+    Bstr name(L"BIG");
+    if (!files || FAILED(files->get_ItemByName(name.Get(), &fileDispatch))) return 0;
+    ComPtr<IReceiverFile> file;
+    fileDispatch.QueryTo(IID_IReceiverFile, file.PutVoid());
+    ComPtr<FinishSink> sink(new FinishSink());
+    sink->Advise(fileDispatch.Get());
+    ComPtr<IStream> stream;
+    CreateStreamOnHGlobal(nullptr, TRUE, stream.ReleaseAndGetAddressOf());
+    VARIANT destination;
+    VariantInit(&destination);
+    destination.vt = VT_UNKNOWN;
+    stream.CopyTo(&destination.punkVal);
+    const HRESULT hr = file->Download(destination);
+    VariantClear(&destination);
+    while (SUCCEEDED(hr) && !sink->finished) Pump();
+    sink->Unadvise(fileDispatch.Get());
+    return sink->result == S_OK ? StreamSize(stream.Get()) : 0;
+}
+
+// The product: the receiver folder's data object asked for the file's contents.
+ULONGLONG ProductDownload() {
+    ComPtr<IShellFolder> root, receiver;
+    CreateCalvexReceiversShellFolder(nullptr, IID_IShellFolder, root.PutVoid());
+    ComPtr<IPersistFolder> persist;
+    root.QueryTo(IID_IPersistFolder, persist.PutVoid());
+    if (!persist || FAILED(persist->Initialize(nullptr))) return 0;
+    ComPtr<IEnumIDList> items;
+    LPITEMIDLIST item = nullptr;
+    root->EnumObjects(nullptr, SHCONTF_FOLDERS, &items);
+    if (!items || items->Next(1, &item, nullptr) != S_OK) return 0;
+    root->BindToObject(item, nullptr, IID_IShellFolder, receiver.PutVoid());
+    CoTaskMemFree(item);
+    items.Reset();
+    if (!receiver) return 0;
+    receiver->EnumObjects(nullptr, SHCONTF_NONFOLDERS, &items);
+    if (!items || items->Next(1, &item, nullptr) != S_OK) return 0;
+    ComPtr<IDataObject> data;
+    receiver->GetUIObjectOf(nullptr, 1, const_cast<LPCITEMIDLIST*>(&item), IID_IDataObject, nullptr, data.PutVoid());
+    CoTaskMemFree(item);
+    FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILECONTENTS)), nullptr,
+                        DVASPECT_CONTENT, 0, TYMED_ISTREAM};
+    STGMEDIUM medium = {};
+    if (!data || data->GetData(&format, &medium) != S_OK) return 0;
+    const ULONGLONG size = StreamSize(medium.pstm);
+    ReleaseStgMedium(&medium);
+    return size;
+}
+}  // namespace
+
+int main(int argc, char** argv) {
+    const size_t mib = argc > 1 ? std::strtoul(argv[1], nullptr, 10) : 64;
+    const size_t bytes = mib << 20;
+    if (FAILED(OleInitialize(nullptr))) return 2;
+    CModuleApp::Instance().EnsureInitialized();
+    SimServerProcess server(MakeTree(bytes));
+    if (!server.Ready()) {
+        std::printf("the simulator did not start\n");
+        return 2;
+    }
+    struct Run {
+        const char* name;
+        ULONGLONG (*download)();
+    } runs[] = {{"raw download (floor)", RawDownload}, {"FileContents (product)", ProductDownload}};
+    double seconds[2] = {};
+    for (int i = 0; i < 2; ++i) {
+        LARGE_INTEGER start;
+        QueryPerformanceCounter(&start);
+        const ULONGLONG got = runs[i].download();
+        seconds[i] = Seconds(start);
+        std::printf("%-24s %8.2f s  %7.2f MiB/s  %s  peak working set %.1f MiB (file %zu MiB)\n", runs[i].name,
+                    seconds[i], mib / seconds[i], got == bytes ? "complete" : "INCOMPLETE", PeakMiB(), mib);
+        std::fflush(stdout);
+    }
+    std::printf("product / floor: %.3f\n", seconds[1] / seconds[0]);
+    OleUninitialize();
+    return 0;
+}

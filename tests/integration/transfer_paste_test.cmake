@@ -1,0 +1,3 @@
+# Points the shared out-of-process simulator at a tree of its own and kills it once.
+set(TEST_SERIAL SERIAL)
+set(TEST_TIMEOUT 400)

@@ -1,0 +1,179 @@
+#include "VirtualFiles.h"
+
+#include <vector>
+
+namespace {
+constexpr ULONG ChunkBytes = 1 << 20;
+
+std::vector<std::wstring> Components(const std::wstring& name) {
+    std::vector<std::wstring> parts;
+    std::wstring part;
+    for (wchar_t c : name) {
+        if (c == L'\\' || c == L'/') {
+            parts.push_back(part);
+            part.clear();
+        } else {
+            part += c;
+        }
+    }
+    parts.push_back(part);
+    return parts;
+}
+
+// Creates the folders between the target and the file; the name was checked to stay inside.
+bool MakeParentFolders(const std::wstring& targetDir, const std::wstring& name) {
+    std::vector<std::wstring> parts = Components(name);
+    std::wstring path = targetDir;
+    for (size_t i = 0; i + 1 < parts.size(); ++i) {
+        if (parts[i].empty()) continue;
+        path += L"\\" + parts[i];
+        if (!CreateDirectoryW(path.c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
+    }
+    return true;
+}
+
+std::wstring ErrorText(const wchar_t* what, DWORD code) {
+    wchar_t text[160];
+    wsprintfW(text, L"%s (0x%08X)", what, static_cast<unsigned>(code));
+    return text;
+}
+
+HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written) {
+    std::vector<BYTE> buffer(ChunkBytes);
+    written = 0;
+    for (;;) {
+        ULONG read = 0;
+        const HRESULT hr = stream->Read(buffer.data(), ChunkBytes, &read);
+        if (FAILED(hr)) return hr;
+        if (read == 0) return S_OK;
+        DWORD out = 0;
+        if (!WriteFile(file, buffer.data(), read, &out, nullptr) || out != read) return HRESULT_FROM_WIN32(GetLastError());
+        written += read;
+    }
+}
+
+HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descriptor, IStream* stream,
+                       std::wstring& error) {
+    HANDLE file = CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
+    if (file == INVALID_HANDLE_VALUE) {
+        error = ErrorText(L"cannot create the temporary file", GetLastError());
+        return HRESULT_FROM_WIN32(GetLastError());
+    }
+    ULONGLONG written = 0;
+    HRESULT hr = CopyStream(stream, file, written);
+    const ULONGLONG expected = (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+    if (FAILED(hr)) {
+        error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
+    } else if ((descriptor.dwFlags & FD_FILESIZE) && written != expected) {
+        error = L"size differs from the descriptor: " + std::to_wstring(written) + L" of " + std::to_wstring(expected);
+        hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
+    } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &descriptor.ftLastWriteTime)) {
+        error = ErrorText(L"cannot set the write time", GetLastError());
+        hr = HRESULT_FROM_WIN32(GetLastError());
+    }
+    CloseHandle(file);
+    return hr;
+}
+
+HRESULT ReadDescriptor(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
+    FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILEDESCRIPTORW)), nullptr,
+                        DVASPECT_CONTENT, -1, TYMED_HGLOBAL};
+    STGMEDIUM medium = {};
+    HRESULT hr = data->GetData(&format, &medium);
+    if (hr != S_OK) return FAILED(hr) ? hr : E_FAIL;
+    if (medium.tymed != TYMED_HGLOBAL) {
+        ReleaseStgMedium(&medium);
+        return DV_E_TYMED;
+    }
+    const SIZE_T bytes = GlobalSize(medium.hGlobal);
+    if (auto* group = static_cast<const FILEGROUPDESCRIPTORW*>(GlobalLock(medium.hGlobal))) {
+        const SIZE_T room = bytes < sizeof(UINT) ? 0 : (bytes - sizeof(UINT)) / sizeof(FILEDESCRIPTORW);
+        if (group->cItems <= room) files.assign(group->fgd, group->fgd + group->cItems);
+        else hr = E_UNEXPECTED;
+        GlobalUnlock(medium.hGlobal);
+    }
+    ReleaseStgMedium(&medium);
+    return hr;
+}
+
+// Through a clipboard snapshot QueryGetData with an index fails: ask GetData directly.
+HRESULT ReadContents(IDataObject* data, LONG index, IStream** stream) {
+    FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILECONTENTS)), nullptr,
+                        DVASPECT_CONTENT, index, TYMED_ISTREAM};
+    STGMEDIUM medium = {};
+    HRESULT hr = data->GetData(&format, &medium);
+    if (hr != S_OK) return FAILED(hr) ? hr : S_FALSE;
+    if (medium.tymed != TYMED_ISTREAM || !medium.pstm) {
+        ReleaseStgMedium(&medium);
+        return DV_E_TYMED;
+    }
+    *stream = medium.pstm;
+    medium.pstm->AddRef();
+    ReleaseStgMedium(&medium);
+    return S_OK;
+}
+}  // namespace
+
+bool IsSafeDescriptorName(const std::wstring& name) {
+    if (name.empty() || name[0] == L'\\' || name[0] == L'/' || name.find(L':') != std::wstring::npos) return false;
+    std::vector<std::wstring> parts = Components(name);
+    if (parts.back().empty()) return false;
+    for (const std::wstring& part : parts) {
+        if (part == L"." || part == L"..") return false;
+    }
+    return true;
+}
+
+HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
+                         std::wstring& error) {
+    const std::wstring name = descriptor.cFileName;
+    if (!IsSafeDescriptorName(name)) {
+        error = L"refused name \"" + name + L"\"";
+        return E_ACCESSDENIED;
+    }
+    if (!MakeParentFolders(targetDir, name)) {
+        error = ErrorText(L"cannot create the folders", GetLastError());
+        return HRESULT_FROM_WIN32(GetLastError());
+    }
+    const std::wstring path = targetDir + L"\\" + name;
+    const std::wstring temporary = path + L".calvex-partial";
+    HRESULT hr = WriteTemporary(temporary, descriptor, stream, error);
+    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING)) {
+        error = ErrorText(L"cannot rename the temporary file", GetLastError());
+        hr = HRESULT_FROM_WIN32(GetLastError());
+    }
+    if (FAILED(hr)) DeleteFileW(temporary.c_str());
+    return hr;
+}
+
+int PasteVirtualFiles(IDataObject* data, const std::wstring& targetDir, const PasteReport& report, int& failed) {
+    failed = 0;
+    std::vector<FILEDESCRIPTORW> files;
+    HRESULT hr = ReadDescriptor(data, files);
+    if (FAILED(hr)) {
+        report(ErrorText(L"no file descriptor", static_cast<DWORD>(hr)));
+        failed = 1;
+        return 0;
+    }
+    int written = 0;
+    for (size_t i = 0; i < files.size(); ++i) {
+        std::wstring error;
+        IStream* stream = nullptr;
+        hr = IsSafeDescriptorName(files[i].cFileName) ? ReadContents(data, static_cast<LONG>(i), &stream)
+                                                       : E_ACCESSDENIED;
+        if (hr == S_OK) {
+            hr = WriteVirtualFile(targetDir, files[i], stream, error);
+            stream->Release();
+        } else {
+            error = hr == E_ACCESSDENIED ? L"refused name" : ErrorText(L"no contents", static_cast<DWORD>(hr));
+        }
+        if (hr == S_OK) {
+            ++written;
+            report(L"copied " + std::wstring(files[i].cFileName));
+        } else {
+            ++failed;
+            report(L"failed " + std::wstring(files[i].cFileName) + L": " + error);
+        }
+    }
+    return written;
+}
