@@ -34,7 +34,8 @@ CCalvexReceiversShellView::~CCalvexReceiversShellView() {
     TraceA("CCalvexReceiversShellView::~CCalvexReceiversShellView %p\n", this);
     HideFindAnimation();
     m_folderPidl.Reset();
-    if (m_viewWindow && IsWindow(m_viewWindow)) {
+    if (m_viewWindow && IsWindow(m_viewWindow) &&
+        GetWindowLongPtrW(m_viewWindow, GWLP_USERDATA) == reinterpret_cast<LONG_PTR>(this)) {
         // A browser that never called DestroyViewWindow must not leave a window pointing at us.
         SetWindowLongPtrW(m_viewWindow, GWLP_USERDATA, 0);
         DestroyWindow(m_viewWindow);
@@ -263,6 +264,10 @@ LRESULT CALLBACK CCalvexReceiversShellView::WindowProc(HWND hwnd, UINT message, 
     if (!view) return DefWindowProcW(hwnd, message, wParam, lParam);
     if (message == WM_DESTROY) {
         view->m_listControl.Unsubclass();
+        return DefWindowProcW(hwnd, message, wParam, lParam);
+    }
+    if (message == WM_NCDESTROY) {
+        SetWindowLongPtrW(hwnd, GWLP_USERDATA, 0);  // the handle value alone stays, for the folder's list
         return DefWindowProcW(hwnd, message, wParam, lParam);
     }
     return view->HandleMessage(message, wParam, lParam);

@@ -215,6 +215,7 @@ LRESULT CCalvexReceiversShellView::OnNotify(NMHDR* header) {
 
 void CCalvexReceiversShellView::OnGetDispInfo(NMLVDISPINFOW* info) {
     auto item = reinterpret_cast<LPCITEMIDLIST>(info->item.lParam);
+    if (!m_folder) return;
     if ((info->item.mask & LVIF_TEXT) && info->item.iSubItem == 0 && item) {
         STRRET name = {};
         if (SUCCEEDED(m_folder->GetDisplayNameOf(item, SHGDN_INFOLDER, &name)) && name.uType == STRRET_WSTR) {

@@ -136,10 +136,8 @@ TEST(ShellNamespace, BrandsListOnlyTheirOwnReceivers) {
         EXPECT_EQ(seen[1].end(), std::find(seen[1].begin(), seen[1].end(), key)) << testsupport::Narrow(key);
 }
 
-// Wine's ExplorerBrowser asks the folder for its view; until the folder has a view of its
-// own it gets E_NOINTERFACE and cannot show the folder. What holds now: the browser walks
-// into the receiver (our folder is made for it), asks it for a view and fails cleanly,
-// without hanging or crashing. Once the view exists, this test must see S_OK instead.
+// Wine's ExplorerBrowser walks into the receiver (our folder is made for it), asks it for
+// its view and shows it: the view lists the receiver's files.
 TEST(ShellNamespace, ExplorerBrowserWalksIntoAReceiverAndAsksForItsView) {
     const std::wstring root = std::wstring(kComputer) + L"\\" + kCalvex;
     LPITEMIDLIST rootPidl = ParseFromDesktop(root);
@@ -162,11 +160,12 @@ TEST(ShellNamespace, ExplorerBrowserWalksIntoAReceiverAndAsksForItsView) {
     const size_t from = testsupport::ReadTraceLog().size();
     const HRESULT hr = browser->BrowseToIDList(receiverPidl, SBSP_ABSOLUTE);
     testsupport::PumpMessagesFor(500);
-    EXPECT_TRUE(FAILED(hr)) << "no view yet";
+    EXPECT_EQ(S_OK, hr);
     const std::string trace = testsupport::ReadTraceLog().substr(from);
     EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::Init " + testsupport::Narrow(receiverPath) + "\r\n"))
         << "the browser bound the receiver folder";
     EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::CreateViewObject from 0x"));
+    EXPECT_NE(std::string::npos, trace.find("CCalvexReceiversShellView::OnEnumIdList - OK\r\n"));
     CoTaskMemFree(receiverPidl);
     browser->Destroy();
     browser.Reset();

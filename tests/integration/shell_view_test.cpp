@@ -99,10 +99,6 @@ public:
     ComPtr<IStream> viewState;
 };
 
-IReceiversShellFolderImpl* Impl(IShellFolder* folder) {
-    return static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder));
-}
-
 ComPtr<IShellFolder> RootFolder(bool brennor = false) {
     ComPtr<IShellFolder> root;
     (brennor ? CreateBrennorReceiversShellFolder : CreateCalvexReceiversShellFolder)(nullptr, IID_IShellFolder,
@@ -232,6 +228,10 @@ protected:
         ReceiverSetup setup;
         setup.folder = L"Calvex A";
         tree.AddReceiver(setup);
+        setup.folder = L"Brennor A";
+        setup.brand = 2;
+        setup.serialNumber = L"2000-0001";
+        tree.AddReceiver(setup);
         tree.AddFile(L"Calvex A", L"LOG0001", 100);
         tree.AddFile(L"Calvex A", L"LOG0002", 1536);
         tree.AddFile(L"Calvex A", L"LOG0003", 2048);
@@ -285,12 +285,20 @@ TEST_F(ShellViewTest, BothLevelsShowTheirColumnsItemsAndStatusText) {
     EXPECT_EQ(L"2.0 KB", files.Cell(2, 1));
 }
 
-TEST_F(ShellViewTest, BrennorRootHasItsOwnStatusPrefix) {
+TEST_F(ShellViewTest, OnlyABrennorRootGetsTheBrennorStatusPrefix) {
     ComPtr<IShellFolder> root = RootFolder(true);
+    ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
+    ASSERT_TRUE(receiver);
     TestBrowser browser(false);
-    HostedView host(root.Get(), browser);
-    host.view->UIActivate(SVUIA_ACTIVATE_FOCUS);
-    EXPECT_EQ(0u, browser.statusText.find(L"Brennor GNSS Receivers: "));
+    const std::pair<IShellFolder*, const wchar_t*> cases[] = {
+        {root.Get(), L"Brennor GNSS Receivers: Calvex Receivers"},  // both roots carry that name
+        {receiver.Get(), L"Calvex GNSS Receivers: Calvex Receivers\\2000-0001!Q9 GNSS!USB"},
+    };
+    for (const auto& c : cases) {
+        HostedView host(c.first, browser);
+        host.view->UIActivate(SVUIA_ACTIVATE_FOCUS);
+        EXPECT_EQ(c.second, browser.statusText);
+    }
 }
 
 TEST_F(ShellViewTest, ModeComesFromOurPreviousViewElseFromTheStreamsFirstFourBytes) {
