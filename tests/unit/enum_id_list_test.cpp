@@ -11,7 +11,6 @@
 #include "com/Bstr.h"
 #include "com/ModuleLock.h"
 #include "items/CCalvexReceiversEnumIDList.h"
-#include "items/ItemPath.h"
 #include "module/ModuleApp.h"
 #include "pidl_test_malloc.h"
 #include "support/DeviceSim.h"
@@ -300,41 +299,5 @@ TEST_F(EnumIDListTest, TraceLines) {
     EXPECT_EQ(messages[create + 1], expected[1]);
     EXPECT_TRUE(TraceContains(expected[2])) << expected[2];
     EXPECT_FALSE(TraceContains("files: 3")) << "a receivers collection lists no files";
-}
-
-// The repository's sample receivers, listed as a whole: brands, labels, ports, odd names.
-TEST_F(EnumIDListTest, SampleReceiversAndTheirFiles) {
-    ComPtr<IDeviceMgr> manager;
-    ASSERT_EQ(S_OK, CreateSimDeviceManager(SampleReceiversDir().c_str(), IID_IDeviceMgr, manager.PutVoid()));
-    m_managers.push_back(manager);
-    ComPtr<IReceiversColl> receivers = ReceiversOf(manager.Get());
-    const struct {
-        DWORD brand;
-        const wchar_t* key;  // null: the receivers of the brand
-        std::vector<std::wstring> names;
-    } cases[] = {
-        {1, nullptr, {L"123-45678!Z#5!COM12", L"5211-40125!Q7#RTK!COM3", L"5302-00871!Q9 GNSS!USB",
-                      L"5400-00003!Q7#L1-L2!Unknown"}},
-        // "R2 no label" has an empty label and is not listed.
-        {2, nullptr, {L"BR-5500-0009!Compact \x00dc#2!USB", L"HV3-0042117!HVL3-GNSS!USB", L"R2-77810!R2#Net!COM4"}},
-        {1, L"5211-40125!Q7#RTK!COM3", {L"20261103A.T02.qpr", L"LOG0001.qpr", L"LOG0002.qpr"}},
-        {2, L"HV3-0042117!HVL3-GNSS!USB", {L"20261102A.T02.qpr", L"20261103A.T02.qpr", L"LOG0001.qpr"}},
-        {2, L"R2-77810!R2#Net!COM4", {L"LOG0001", L"LOG0002"}},
-        {2, L"BR-5500-0009!Compact \x00dc#2!USB",  // names as the service gives them, "!" and "#" included
-         {L"Mesure \x00e9t\x00e9.log", L"done!", L"point#3", L"site survey 1.dat", L"\x00c5\x00c4\x00d6-\x6f22\x5b57.T02"}},
-    };
-    for (const auto& c : cases) {
-        ComPtr<IFilesColl> files;
-        if (c.key) files = FilesOf(ReceiverByKey(receivers.Get(), ReceiverLookupKey(c.key)).Get());
-        IUnknown* coll = c.key ? static_cast<IUnknown*>(files.Get()) : receivers.Get();
-        std::vector<std::wstring> names;
-        for (const Item& item : Enumerate(c.key ? std::wstring(kRoot) + L"\\" + c.key : kRoot, kFolders | kFiles, coll,
-                                          c.brand)) {
-            EXPECT_EQ(item.type, c.key ? 6u : c.brand + 2) << Narrow(item.name);
-            names.push_back(item.name);
-        }
-        std::sort(names.begin(), names.end());  // the collection's order is the service's own
-        EXPECT_EQ(names, c.names) << (c.key ? Narrow(c.key) : "brand");
-    }
 }
 }  // namespace
