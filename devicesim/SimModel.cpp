@@ -226,6 +226,7 @@ void SimModel::RemoveListener(SimTreeListener* listener) {
 }
 
 HRESULT SimModel::CallFault(const wchar_t* call, const SimReceiverRecord* receiver, const std::wstring& target) const {
+    ++m_callCounts[call];
     HRESULT result = S_OK;
     if (!(receiver && receiver->description.faults.FindCall(call, target, &result)) &&
         !m_globalFaults.FindCall(call, target, &result))
@@ -235,6 +236,11 @@ HRESULT SimModel::CallFault(const wchar_t* call, const SimReceiverRecord* receiv
     SimLog::Write(std::wstring(L"fault: ") + call + (target.empty() ? L"" : L" on \"" + target + L"\"") +
                   L" returns " + code);
     return result;
+}
+
+long SimModel::CallCount(const std::wstring& call) const {
+    auto found = m_callCounts.find(call);
+    return found == m_callCounts.end() ? 0 : found->second;
 }
 
 SimTransferPlan SimModel::TransferPlan(const SimReceiverRecord& receiver) const {

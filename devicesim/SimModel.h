@@ -6,6 +6,7 @@
 #include <windows.h>
 
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -62,6 +63,8 @@ public:
     // to no receiver; target names the file of file-level calls.
     HRESULT CallFault(const wchar_t* call, const SimReceiverRecord* receiver, const std::wstring& target = {}) const;
     SimTransferPlan TransferPlan(const SimReceiverRecord& receiver) const;
+    // How often a call ("IReceiver.get_PortName") was made on this model's objects.
+    long CallCount(const std::wstring& call) const;
     // Ends the process when allowed (never returns then); false otherwise.
     bool AbruptExit(const std::wstring& what) const;
 
@@ -92,6 +95,7 @@ private:
     std::vector<std::shared_ptr<SimReceiverRecord>> m_receivers;
     std::vector<SimTreeScan::Skipped> m_skipped;  // logged when they first appear
     SimFaults m_globalFaults;
+    mutable std::map<std::wstring, long> m_callCounts;  // every call is counted where its fault is looked up
     std::vector<SimTreeListener*> m_listeners;
     std::vector<Download> m_downloads;
     HWND m_window = nullptr;

@@ -1,5 +1,4 @@
-// The DLL's exports as COM and Explorer use them: class objects, the lock count, load and
-// unload with their trace lines and the settings written at unload.
+// Guards the DLL's exports: wrong class objects or lock counts, load and unload trace lines, settings not written at unload.
 #include <windows.h>
 #include <shlobj.h>
 

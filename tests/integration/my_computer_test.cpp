@@ -1,4 +1,4 @@
-// Wine's own shell lists both brand folders under My Computer once the module is registered.
+// Guards registration as Wine's shell reads it: a brand folder missing under My Computer.
 #include <windows.h>
 #include <shlobj.h>
 #include <shlwapi.h>

@@ -1,5 +1,4 @@
-// DllRegisterServer / DllUnregisterServer and regsvr32 in the tests' prefix: the keys
-// Explorer needs to find both brand folders, and their removal. Leaves the module registered.
+// Guards registration: a key Explorer needs missing or wrong, a key left behind at removal, attributes written after a failure.
 #include <windows.h>
 
 #include <string>

@@ -1,7 +1,4 @@
-// Live events: folders bound to the out-of-process simulator follow its tree. A file added
-// or deleted in a receiver and a receiver plugged in or pulled reach the folder's sinks as
-// incoming COM calls, and come out as one shell notification of the folder's full parsing
-// path and, five seconds later, one message to the folder's registered view window.
+// Guards live events: a tree change from the out-of-process simulator lost, notified under a wrong path, or not refreshing the view five seconds later.
 #include <windows.h>
 #include <shlobj.h>
 

@@ -1,6 +1,4 @@
-// Folder lifetimes against the out-of-process simulator: many folders bound and released
-// leave no thread, lock or handle behind; a device manager that dies or is not registered
-// leaves folders that fail or list nothing, without hanging or crashing.
+// Guards folder lifetimes: threads, locks or handles left behind, hangs or crashes when the device manager dies or is missing.
 #include <windows.h>
 #include <shlobj.h>
 #include <tlhelp32.h>

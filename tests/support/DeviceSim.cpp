@@ -1,7 +1,5 @@
 #include "support/DeviceSim.h"
 
-#include <tlhelp32.h>
-
 #include "com/Bstr.h"
 #include "com/Handles.h"
 
@@ -91,16 +89,6 @@ bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str
 void StopDeviceSimServers() {
     // Pumped: a quitting server releases its proxies of this thread's sinks.
     RunProcess(L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" /Quit", 30000);
-}
-
-int RunningDeviceSimServers() {
-    int count = 0;
-    UniqueHandle snapshot(CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0));
-    PROCESSENTRY32W entry = {sizeof entry};
-    for (BOOL more = snapshot && Process32FirstW(snapshot.Get(), &entry); more;
-         more = Process32NextW(snapshot.Get(), &entry))
-        count += CompareStringOrdinal(entry.szExeFile, -1, L"CalvexDeviceSim.exe", -1, TRUE) == CSTR_EQUAL;
-    return count;
 }
 
 void UseDeviceSimRoot(const std::wstring& root) {

@@ -60,8 +60,6 @@ bool FileExists(const std::wstring& path);
 // Makes every running CalvexDeviceSim.exe of the prefix quit ("CalvexDeviceSim.exe /Quit")
 // and waits until they are gone; this thread's messages are pumped meanwhile.
 void StopDeviceSimServers();
-// How many CalvexDeviceSim.exe processes run in the prefix now.
-int RunningDeviceSimServers();
 // Points the out-of-process simulator at root; the next client starts a fresh server.
 void UseDeviceSimRoot(const std::wstring& root);
 // Global faults of the simulator (DWORD values of its registry key, and call failures).

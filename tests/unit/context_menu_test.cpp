@@ -1,5 +1,4 @@
-// The folder's fixed context menu: one item, one information box, narrow texts in wide
-// requests, exact results.
+// Guards the folder's context menu: a wrong item count, text, box or result, wide requests answered narrow.
 #include <windows.h>
 #include <shlobj.h>
 

@@ -1,5 +1,4 @@
-// The dispatch event sink: its identity, its advise cookie, and Invoke driven by the device
-// manager's registered type library (argument order, coercion to the declared types).
+// Guards the dispatch event sink: wrong identity, a cookie kept or lost wrongly, events lost or handed on in the wrong order or types.
 #include <windows.h>
 #include <ocidl.h>
 
@@ -11,6 +10,8 @@
 #include "CalvexDeviceMgrLib.h"
 #include "com/ComPtr.h"
 #include "com/DispEventSink.h"
+#include "SimDeviceManager.h"
+#include "support/DeviceSim.h"
 #include "support/TestSupport.h"
 
 namespace {
@@ -40,45 +41,6 @@ private:
     void OnBegin(const VARIANT* args, UINT count) { Record(1, args, count, 0); }
     void OnProgress(const VARIANT* args, UINT count) { Record(2, args, count, args[1].bVal); }
     void OnFinish(const VARIANT* args, UINT count) { Record(3, args, count, args[1].lVal); }
-};
-
-// One object serving as both the container and its single connection point.
-class FakeSource : public IConnectionPointContainer, public IConnectionPoint {
-public:
-    IID askedFor = GUID_NULL;
-    IUnknown* advised = nullptr;
-    DWORD unadvisedCookie = 0;
-
-    STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override {
-        *ppv = nullptr;
-        if (IsEqualIID(riid, IID_IUnknown) || IsEqualIID(riid, IID_IConnectionPointContainer))
-            *ppv = static_cast<IConnectionPointContainer*>(this);
-        else if (IsEqualIID(riid, IID_IConnectionPoint))
-            *ppv = static_cast<IConnectionPoint*>(this);
-        else
-            return E_NOINTERFACE;
-        return S_OK;
-    }
-    STDMETHODIMP_(ULONG) AddRef() override { return 2; }
-    STDMETHODIMP_(ULONG) Release() override { return 1; }
-    STDMETHODIMP EnumConnectionPoints(IEnumConnectionPoints**) override { return E_NOTIMPL; }
-    STDMETHODIMP FindConnectionPoint(REFIID riid, IConnectionPoint** point) override {
-        askedFor = riid;
-        *point = this;
-        return S_OK;
-    }
-    STDMETHODIMP GetConnectionInterface(IID*) override { return E_NOTIMPL; }
-    STDMETHODIMP GetConnectionPointContainer(IConnectionPointContainer**) override { return E_NOTIMPL; }
-    STDMETHODIMP Advise(IUnknown* sink, DWORD* cookie) override {
-        advised = sink;
-        *cookie = 0x1234;
-        return S_OK;
-    }
-    STDMETHODIMP Unadvise(DWORD cookie) override {
-        unadvisedCookie = cookie;
-        return S_OK;
-    }
-    STDMETHODIMP EnumConnections(IEnumConnections**) override { return E_NOTIMPL; }
 };
 
 class DispEventSinkTest : public testing::Test {
@@ -144,18 +106,37 @@ TEST_F(DispEventSinkTest, AnswersItsThreeInterfacesOnly) {
     EXPECT_EQ(E_POINTER, sink->QueryInterface(IID_IDispatch, nullptr));
 }
 
-TEST_F(DispEventSinkTest, CookieRule) {
-    FakeSource source;
+// Against a file of the in-process simulator: the cookie rule, and a real download's events
+// arriving through the type library in order.
+TEST_F(DispEventSinkTest, CookieRuleAndADownloadsEvents) {
+    testsupport::ReceiverTree tree;
+    tree.AddReceiver({L"r", 1, L"R", L"1", L"Q7", 2, L"", {}});
+    tree.AddFile(L"r", L"LOG0001", 100000);
+    ComPtr<IDeviceMgr> manager;
+    ASSERT_EQ(S_OK, CreateSimDeviceManager(tree.Root().c_str(), IID_IDeviceMgr, manager.PutVoid()));
+    using namespace testsupport;
+    ComPtr<IReceiverFile> file = FileAt(FilesOf(ReceiverAt(ReceiversOf(manager.Get()).Get(), 0).Get()).Get(), 0);
+    ASSERT_TRUE(file);
+
     EXPECT_EQ(0xFEFEFEFEu, sink->Cookie());
-    ASSERT_EQ(S_OK, sink->Advise(static_cast<IConnectionPointContainer*>(&source)));
-    EXPECT_TRUE(IsEqualIID(DIID__IReceiverFileEvents, source.askedFor));
-    EXPECT_EQ(0x1234u, sink->Cookie());
-    source.advised = nullptr;
-    EXPECT_EQ(E_FAIL, sink->Advise(static_cast<IConnectionPointContainer*>(&source))) << "already advised";
-    EXPECT_EQ(nullptr, source.advised);
-    EXPECT_EQ(S_OK, sink->Unadvise(static_cast<IConnectionPointContainer*>(&source)));
-    EXPECT_EQ(0x1234u, source.unadvisedCookie);
+    ASSERT_EQ(S_OK, sink->Advise(file.Get()));
+    const DWORD cookie = sink->Cookie();
+    EXPECT_NE(0xFEFEFEFEu, cookie);
+    EXPECT_EQ(E_FAIL, sink->Advise(file.Get())) << "already advised";
+    EXPECT_EQ(cookie, sink->Cookie());
+    ComPtr<IStream> stream = NewMemoryStream();
+    ASSERT_EQ(S_OK, StartDownload(file.Get(), stream.Get()));
+    ASSERT_TRUE(PumpUntil([&] { return !sink->calls.empty() && sink->calls.back().handler == 3; }, 5000));
+    EXPECT_EQ(1, sink->calls.front().handler);
+    EXPECT_EQ((std::vector<VARTYPE>{VT_DISPATCH, VT_UI1}), sink->calls[1].types);
+    EXPECT_EQ(100, sink->calls[sink->calls.size() - 2].number);
+    EXPECT_EQ(S_OK, sink->calls.back().number);
+    EXPECT_EQ(S_OK, sink->Unadvise(file.Get()));
     EXPECT_EQ(0xFEFEFEFEu, sink->Cookie());
+    const size_t heard = sink->calls.size();
+    ASSERT_EQ(S_OK, StartDownload(file.Get(), NewMemoryStream().Get()));
+    PumpMessagesFor(300);
+    EXPECT_EQ(heard, sink->calls.size()) << "an unadvised sink was called";
 
     IUnknown* notASource = sink;  // has no connection points
     EXPECT_EQ(E_NOINTERFACE, sink->Advise(notASource));

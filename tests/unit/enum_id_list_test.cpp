@@ -1,5 +1,4 @@
-// CCalvexReceiversEnumIDList against an in-process fake of the device manager: what is
-// listed, in which order, under which names; Next/Skip/Reset/Clone; the failure rules.
+// Guards the enumerator over the in-process simulator: wrong items, names, order or ".qpr" rule, device faults not skipped, wrong Next/Skip results, trace lines, leaked items and device objects.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -8,15 +7,16 @@
 #include <string>
 #include <vector>
 
-#include "enum_id_list_fake.h"
+#include "SimDeviceManager.h"
+#include "com/Bstr.h"
+#include "com/ModuleLock.h"
 #include "items/CCalvexReceiversEnumIDList.h"
 #include "module/ModuleApp.h"
 #include "pidl_test_malloc.h"
-#include "support/TestSupport.h"
+#include "support/DeviceSim.h"
 
 namespace {
-using fake::FileSpec;
-using fake::ReceiverSpec;
+using namespace testsupport;
 
 struct Item {
     DWORD type;
@@ -25,34 +25,46 @@ struct Item {
     DATE time;
     bool operator==(const Item& o) const { return type == o.type && name == o.name; }
 };
-std::ostream& operator<<(std::ostream& out, const Item& item) {
-    return out << item.type << ":" << testsupport::Narrow(item.name);
+std::ostream& operator<<(std::ostream& out, const Item& item) { return out << item.type << ":" << Narrow(item.name); }
+
+const wchar_t kRoot[] = L"Calvex Receivers";
+const DWORD kFolders = SHCONTF_FOLDERS;
+const DWORD kFiles = SHCONTF_NONFOLDERS;
+
+// A receiver "<serial>!M1!COM3" of brand 1 unless told otherwise; faults as [Fail] lines.
+ReceiverSetup Rx(const wchar_t* serial, long brand = 1, std::vector<std::wstring> lines = {},
+                 const wchar_t* model = L"M1", long portType = 1) {
+    return {serial, brand, L"Base", serial, model, portType, L"COM3", std::move(lines)};
 }
 
 class EnumIDListTest : public ::testing::Test {
 protected:
     static void SetUpTestSuite() { CModuleApp::Instance().EnsureInitialized(); }
     void TearDown() override {
-        ReleaseCollections();
-        EXPECT_EQ(log.live, 0) << "a device object was not released";
+        m_managers.clear();
+        EXPECT_EQ(ModuleLock::Count(), m_baseLocks) << "a device object or enumerator was not released";
         EXPECT_EQ(malloc.Outstanding(), 0u) << "an item list or node was leaked";
         EXPECT_EQ(malloc.HeldReferences(), baseRefs) << "an enumerator was not destroyed";
     }
 
-    IUnknown* Receivers(std::vector<ReceiverSpec> specs) {
-        held.push_back(new fake::ReceiversColl(std::move(specs), &log));
-        return held.back();
+    // The receivers collection of a fresh simulator over a tree of its own; files (name, size)
+    // go to the first receiver before the simulator reads the tree.
+    ComPtr<IReceiversColl> Receivers(const std::vector<ReceiverSetup>& receivers,
+                                     const std::vector<std::pair<const wchar_t*, size_t>>& files = {}) {
+        m_trees.emplace_back(new ReceiverTree);
+        for (const ReceiverSetup& setup : receivers) m_trees.back()->AddReceiver(setup);
+        for (const auto& file : files) m_trees.back()->AddFile(receivers[0].folder, file.first, file.second);
+        ComPtr<IDeviceMgr> manager;
+        EXPECT_EQ(S_OK, CreateSimDeviceManager(m_trees.back()->Root().c_str(), IID_IDeviceMgr, manager.PutVoid()));
+        m_managers.push_back(manager);
+        return ReceiversOf(manager.Get());
     }
-    IUnknown* Files(std::vector<FileSpec> specs) {
-        held.push_back(new fake::FilesColl(std::move(specs), &log));
-        return held.back();
-    }
-    void ReleaseCollections() {
-        for (IUnknown* unknown : held) unknown->Release();
-        held.clear();
+    // The files collection of one receiver holding these files, with these [Times] and [Fail] lines.
+    ComPtr<IFilesColl> Files(const std::vector<std::pair<const wchar_t*, size_t>>& files,
+                             std::vector<std::wstring> lines = {}) {
+        return FilesOf(ReceiverAt(Receivers({Rx(L"R", 1, std::move(lines))}, files).Get(), 0).Get());
     }
 
-    // Init, then everything Next gives one at a time. Null on an Init failure.
     ComObject<CCalvexReceiversEnumIDList>* Make(const wchar_t* path, DWORD flags, IUnknown* coll, DWORD brand,
                                                 HRESULT* hr) {
         ComObject<CCalvexReceiversEnumIDList>* enumerator = nullptr;
@@ -73,9 +85,9 @@ protected:
         }
         return items;
     }
-    std::vector<Item> Enumerate(const wchar_t* path, DWORD flags, IUnknown* coll, DWORD brand) {
+    std::vector<Item> Enumerate(const std::wstring& path, DWORD flags, IUnknown* coll, DWORD brand) {
         HRESULT hr = E_FAIL;
-        ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(path, flags, coll, brand, &hr);
+        ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(path.c_str(), flags, coll, brand, &hr);
         EXPECT_EQ(hr, S_OK);
         if (!enumerator) return {};
         std::vector<Item> items = Drain(enumerator);
@@ -83,138 +95,101 @@ protected:
         return items;
     }
 
-    fake::Log log;
     GuardedMalloc malloc;
     CReceiversPidlMgr mgr{&malloc};
     const ULONG baseRefs = malloc.HeldReferences();  // the test's own manager
-    std::vector<IUnknown*> held;
+    const LONG m_baseLocks = ModuleLock::Count();
+    std::vector<std::unique_ptr<ReceiverTree>> m_trees;
+    std::vector<ComPtr<IDeviceMgr>> m_managers;
 };
 
-const wchar_t kRoot[] = L"Calvex Receivers";
-const DWORD kFolders = SHCONTF_FOLDERS;
-const DWORD kFiles = SHCONTF_NONFOLDERS;
-
-ReceiverSpec Rx(const wchar_t* serial, long brand = 1) {
-    ReceiverSpec spec;
-    spec.serial = serial;
-    spec.brand = brand;
-    return spec;
-}
-template <class Spec, class Change>
-Spec With(Spec spec, Change change) {
-    change(spec);
-    return spec;
-}
-
 TEST_F(EnumIDListTest, ReceiversOfTheFolderBrandWithALabel) {
-    const std::vector<ReceiverSpec> mixed = {Rx(L"A"), Rx(L"B", 2), Rx(L"C")};
+    const std::vector<ReceiverSetup> mixed = {Rx(L"A"), Rx(L"B", 2), Rx(L"C")};
+    ReceiverSetup unlabelled = Rx(L"A");
+    unlabelled.label.clear();
     const struct {
         const char* what;
-        std::vector<ReceiverSpec> receivers;
+        std::vector<ReceiverSetup> receivers;
         DWORD brand;
         std::vector<Item> expected;
     } cases[] = {
         {"brand 1 of three", mixed, 1, {{3, L"A!M1!COM3"}, {3, L"C!M1!COM3"}}},
         {"brand 2 of three", mixed, 2, {{4, L"B!M1!COM3"}}},
-        {"brand S_FALSE", {With(Rx(L"A"), [](ReceiverSpec& s) { s.brandResult = S_FALSE; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"label empty", {With(Rx(L"A"), [](ReceiverSpec& s) { s.label = L""; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"label null", {With(Rx(L"A"), [](ReceiverSpec& s) { s.label = nullptr; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"label S_FALSE", {With(Rx(L"A"), [](ReceiverSpec& s) { s.labelResult = S_FALSE; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"get_Item fails", {With(Rx(L"A"), [](ReceiverSpec& s) { s.item.result = E_FAIL; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"get_Item null", {With(Rx(L"A"), [](ReceiverSpec& s) { s.item.null = true; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"no IReceiver", {With(Rx(L"A"), [](ReceiverSpec& s) { s.item.refuseInterface = true; }), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"model with slashes", {With(Rx(L"A"), [](ReceiverSpec& s) { s.model = L"A/B/C"; })}, 1, {{3, L"A!A#B#C!COM3"}}},
-        {"port USB", {With(Rx(L"A"), [](ReceiverSpec& s) { s.portType = 2; })}, 1, {{3, L"A!M1!USB"}}},
-        {"port unknown", {With(Rx(L"A"), [](ReceiverSpec& s) { s.portType = 7; })}, 1, {{3, L"A!M1!Unknown"}}},
+        {"brand S_FALSE", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Brand=1"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"brand fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Brand=0x80004005"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"label empty", {unlabelled, Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"label S_FALSE", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Label=1"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"label fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Label=0x80004005"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"get_Item fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiversColl.get_Item=0x80004005"}), Rx(L"B")}, 1,
+         {{3, L"B!M1!COM3"}}},
+        {"model with slashes", {Rx(L"A", 1, {}, L"A/B/C")}, 1, {{3, L"A!A#B#C!COM3"}}},
+        {"port USB", {Rx(L"A", 1, {}, L"M1", 2)}, 1, {{3, L"A!M1!USB"}}},
+        {"port unknown", {Rx(L"A", 1, {}, L"M1", 7)}, 1, {{3, L"A!M1!Unknown"}}},
         {"brand 7 folder", mixed, 7, {}},
     };
-    for (const auto& c : cases) {
-        EXPECT_EQ(Enumerate(kRoot, kFolders, Receivers(c.receivers), c.brand), c.expected) << c.what;
-        ReleaseCollections();
-    }
+    for (const auto& c : cases) EXPECT_EQ(Enumerate(kRoot, kFolders, Receivers(c.receivers).Get(), c.brand), c.expected) << c.what;
 }
 
 TEST_F(EnumIDListTest, PortNameIsReadForNamedPortsOnly) {
     for (long portType : {1L, 2L, 7L}) {
-        log.calls.clear();
-        Enumerate(kRoot, kFolders, Receivers({With(Rx(L"A"), [&](ReceiverSpec& s) { s.portType = portType; })}), 1);
-        const bool read = std::count(log.calls.begin(), log.calls.end(), "get_PortName") > 0;
-        EXPECT_EQ(read, portType == 1) << "port type " << portType;
-        ReleaseCollections();
+        Enumerate(kRoot, kFolders, Receivers({Rx(L"A", 1, {}, L"M1", portType)}).Get(), 1);
+        EXPECT_EQ(SimModel::Acquire(m_trees.back()->Root())->CallCount(L"IReceiver.get_PortName"), portType == 1 ? 1 : 0)
+            << "port type " << portType;
     }
 }
 
 TEST_F(EnumIDListTest, FilesGetQprForBrandOneAndTheHvl3FamilyOnly) {
+    ComPtr<IFilesColl> files = Files({{L"LOG1", 10}});
     const struct {
         const wchar_t* path;
         DWORD brand;
-        const wchar_t* name;
         const wchar_t* expected;
     } cases[] = {
-        {L"Calvex Receivers\\1!M1!COM3", 1, L"LOG1", L"LOG1.qpr"},
-        {L"Calvex Receivers\\1", 1, L"LOG1", L"LOG1.qpr"},
-        {L"Calvex Receivers\\1!HVL3xxx!USB", 2, L"LOG1", L"LOG1.qpr"},
-        {L"Calvex Receivers\\1!HVL3!USB", 2, L"LOG1", L"LOG1.qpr"},
-        {L"Calvex Receivers\\1!HVL3#2!USB", 2, L"LOG1", L"LOG1.qpr"},
-        {L"Calvex Receivers\\1!HVL!USB", 2, L"LOG1", L"LOG1"},
-        {L"Calvex Receivers\\1!hvl3!USB", 2, L"LOG1", L"LOG1"},
-        {L"Calvex Receivers\\1!M2!USB", 2, L"LOG1", L"LOG1"},
-        {L"Calvex Receivers\\HVL3", 2, L"LOG1", L"LOG1"},
-        {L"Calvex Receivers\\1!M1!COM3", 1, L"a/b", L"a\\b.qpr"},
+        {L"Calvex Receivers\\1!M1!COM3", 1, L"LOG1.qpr"},    {L"Calvex Receivers\\1", 1, L"LOG1.qpr"},
+        {L"Calvex Receivers\\1!HVL3xxx!USB", 2, L"LOG1.qpr"}, {L"Calvex Receivers\\1!HVL3!USB", 2, L"LOG1.qpr"},
+        {L"Calvex Receivers\\1!HVL3#2!USB", 2, L"LOG1.qpr"},  {L"Calvex Receivers\\1!HVL!USB", 2, L"LOG1"},
+        {L"Calvex Receivers\\1!hvl3!USB", 2, L"LOG1"},        {L"Calvex Receivers\\1!M2!USB", 2, L"LOG1"},
+        {L"Calvex Receivers\\HVL3", 2, L"LOG1"},
     };
-    for (const auto& c : cases) {
-        FileSpec file;
-        file.name = c.name;
-        EXPECT_EQ(Enumerate(c.path, kFiles, Files({file}), c.brand), (std::vector<Item>{{6, c.expected}}))
-            << testsupport::Narrow(c.path);
-        ReleaseCollections();
-    }
+    for (const auto& c : cases)
+        EXPECT_EQ(Enumerate(c.path, kFiles, files.Get(), c.brand), (std::vector<Item>{{6, c.expected}})) << Narrow(c.path);
 }
 
 TEST_F(EnumIDListTest, FilesCarrySizeAndTimeInCollectionOrder) {
-    std::vector<FileSpec> files(4);
-    files[0].name = L"F0", files[0].size = -1, files[0].time = 45000.5;
-    files[1].name = L"F1", files[1].item.result = E_FAIL;
-    files[2].name = L"F2", files[2].size = 7, files[2].sizeResult = E_FAIL;
-    files[3].name = L"F3", files[3].size = 1536, files[3].time = 1.25;
-    std::vector<Item> items = Enumerate(L"Calvex Receivers\\1!M1!COM3", kFiles, Files(files), 1);
+    ComPtr<IFilesColl> files = Files({{L"F0", 0}, {L"F1", 5}, {L"F2", 7}, {L"F3", 1536}},
+                                     {L"[Times]", L"F0=2023-03-15 12:00:00", L"F3=1900-01-01 06:00:00", L"[Fail]",
+                                      L"IFilesColl.get_Item:F1=0x80004005", L"IReceiverFile.get_Size:F2=0x80004005"});
+    std::vector<Item> items = Enumerate(L"Calvex Receivers\\1!M1!COM3", kFiles, files.Get(), 1);
     ASSERT_EQ(items, (std::vector<Item>{{6, L"F0.qpr"}, {6, L"F2.qpr"}, {6, L"F3.qpr"}}));
-    EXPECT_EQ(items[0].size, 0xFFFFFFFFu);
     EXPECT_EQ(items[0].time, 45000.5);
     EXPECT_EQ(items[1].size, 0u) << "a size that cannot be read stays 0";
     EXPECT_EQ(items[2].size, 1536u);
-    EXPECT_EQ(items[2].time, 1.25);
+    EXPECT_EQ(items[2].time, 2.25);
 }
 
 TEST_F(EnumIDListTest, CollectionsAndFlagsThatListNothing) {
+    ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A")});
+    ComPtr<IFilesColl> files = Files({{L"LOG1", 1}});
     const struct {
         const char* what;
         const wchar_t* path;
         DWORD flags;
-        bool filesCollection;
-        bool nullCollection;
+        IUnknown* coll;
     } cases[] = {
-        {"no collection", kRoot, kFolders | kFiles, false, true},
-        {"receivers wanted of a files collection", kRoot, kFolders, true, false},
-        {"files wanted of a receivers collection", kRoot, kFiles, false, false},
-        {"neither flag", kRoot, SHCONTF_INCLUDEHIDDEN, false, false},
-        {"neither flag, path of separators", L"\\\\//", 0, false, false},
+        {"no collection", kRoot, kFolders | kFiles, nullptr},
+        {"receivers wanted of a files collection", kRoot, kFolders, files.Get()},
+        {"files wanted of a receivers collection", kRoot, kFiles, receivers.Get()},
+        {"neither flag", kRoot, SHCONTF_INCLUDEHIDDEN, receivers.Get()},
+        {"neither flag, path of separators", L"\\\\//", 0, receivers.Get()},
     };
-    for (const auto& c : cases) {
-        IUnknown* coll = c.nullCollection ? nullptr : c.filesCollection ? Files({FileSpec()}) : Receivers({Rx(L"A")});
-        EXPECT_TRUE(Enumerate(c.path, c.flags, coll, 1).empty()) << c.what;
-        ReleaseCollections();
-    }
-}
-
-TEST_F(EnumIDListTest, ItemPathIsTheGivenPathNotTheDefault) {
+    for (const auto& c : cases) EXPECT_TRUE(Enumerate(c.path, c.flags, c.coll, 1).empty()) << c.what;
     // An empty folder path passes the component check through the default root name, but
     // the items are made from the path as given: "\key" makes a root-kind item.
-    EXPECT_EQ(Enumerate(L"", kFolders, Receivers({Rx(L"A")}), 1), (std::vector<Item>{{1, L"A!M1!COM3"}}));
-    ReleaseCollections();
+    EXPECT_EQ(Enumerate(L"", kFolders, receivers.Get(), 1), (std::vector<Item>{{1, L"A!M1!COM3"}}));
 }
 
 TEST_F(EnumIDListTest, FailuresDestroyTheEnumerator) {
+    ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A"), Rx(L"B")});
     const struct {
         const char* what;
         const wchar_t* path;
@@ -232,7 +207,7 @@ TEST_F(EnumIDListTest, FailuresDestroyTheEnumerator) {
         ASSERT_EQ(CreateComObject<CCalvexReceiversEnumIDList>(&enumerator, &malloc), S_OK);
         malloc.FailAfter(c.allocations);
         HRESULT hr = E_FAIL;
-        enumerator->Init(c.path, c.flags, Receivers({Rx(L"A"), Rx(L"B")}), 1, &hr);
+        enumerator->Init(c.path, c.flags, receivers.Get(), 1, &hr);
         malloc.FailAfter(-1);
         EXPECT_EQ(hr, c.expected) << c.what;
         if (SUCCEEDED(hr)) {
@@ -240,14 +215,13 @@ TEST_F(EnumIDListTest, FailuresDestroyTheEnumerator) {
             enumerator->Release();
         }
         EXPECT_EQ(malloc.HeldReferences(), baseRefs) << c.what << ": the enumerator must be gone";
-        ReleaseCollections();
     }
 }
 
 TEST_F(EnumIDListTest, NextSkipResetClone) {
     HRESULT hr = E_FAIL;
-    ComObject<CCalvexReceiversEnumIDList>* enumerator =
-        Make(kRoot, kFolders, Receivers({Rx(L"A"), Rx(L"B")}), 1, &hr);
+    ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A"), Rx(L"B")});
+    ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(kRoot, kFolders, receivers.Get(), 1, &hr);
     ASSERT_TRUE(enumerator);
     IEnumIDList* e = enumerator;
     PITEMID_CHILD out[3] = {};
@@ -296,41 +270,34 @@ TEST_F(EnumIDListTest, NextSkipResetClone) {
     EXPECT_EQ(out[0], nullptr);
     EXPECT_EQ(out[1], nullptr);
     EXPECT_EQ(e->Next(1, out, &fetched), S_FALSE);
-
     enumerator->Release();
-    ReleaseCollections();
 }
 
 TEST_F(EnumIDListTest, TraceLines) {
-    IUnknown* receivers = Receivers({Rx(L"A"), Rx(L"B", 2), Rx(L"C")});
+    ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A"), Rx(L"B", 2), Rx(L"C")});
     HRESULT hr = E_FAIL;
-    ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(kRoot, kFolders | kFiles, receivers, 2, &hr);
+    ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(kRoot, kFolders | kFiles, receivers.Get(), 2, &hr);
     ASSERT_TRUE(enumerator);
     char expected[3][160];
     _snprintf(expected[0], 160, "CCalvexReceiversEnumIDList::CreateEnumList(Calvex Receivers, 96, 0x%08X, 2)\r\n",
-              static_cast<unsigned>(reinterpret_cast<uintptr_t>(receivers)));
+              static_cast<unsigned>(reinterpret_cast<uintptr_t>(static_cast<IUnknown*>(receivers.Get()))));
     _snprintf(expected[1], 160, "CCalvexReceiversEnumIDList::CreateEnumList - receivers:3 %p\r\n",
               static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(enumerator)));
     enumerator->Release();
 
-    IUnknown* files = Files({FileSpec(), FileSpec()});
-    enumerator = Make(L"Calvex Receivers\\1!M!P", kFiles, files, 1, &hr);
+    enumerator = Make(L"Calvex Receivers\\1!M!P", kFiles, Files({{L"F1", 1}, {L"F2", 1}}).Get(), 1, &hr);
     ASSERT_TRUE(enumerator);
     _snprintf(expected[2], 160, "CCalvexReceiversEnumIDList::CreateEnumList - files: 2 %p\r\n",
               static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(enumerator)));
     enumerator->Release();
-    ReleaseCollections();
 
-    const std::vector<std::string> messages = testsupport::TraceMessages();
-    auto at = [&](const std::string& line) {
-        return std::find(messages.begin(), messages.end(), line) - messages.begin();
-    };
-    const size_t create = static_cast<size_t>(at(expected[0]));
+    const std::vector<std::string> messages = TraceMessages();
+    const size_t create = static_cast<size_t>(std::find(messages.begin(), messages.end(), expected[0]) - messages.begin());
     ASSERT_LT(create + 1, messages.size()) << expected[0];
     ASSERT_GT(create, 0u);
     EXPECT_EQ(messages[create - 1], "CCalvexReceiversEnumIDList::Init\r\n");
     EXPECT_EQ(messages[create + 1], expected[1]);
-    EXPECT_TRUE(testsupport::TraceContains(expected[2])) << expected[2];
-    EXPECT_FALSE(testsupport::TraceContains("files: 3")) << "a receivers collection lists no files";
+    EXPECT_TRUE(TraceContains(expected[2])) << expected[2];
+    EXPECT_FALSE(TraceContains("files: 3")) << "a receivers collection lists no files";
 }
 }  // namespace

@@ -1,5 +1,4 @@
-// CCalvexReceiversExtractIcon: index from the item kind, the location left alone, and the
-// pictures handed out are the module's icons for that kind.
+// Guards icon extraction: a wrong index for an item kind, a location touched, icons not the module's own.
 #include <gtest/gtest.h>
 
 #include <windows.h>

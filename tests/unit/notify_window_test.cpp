@@ -1,5 +1,4 @@
-// The hidden notify window: folder paths posted to it come out as one SHChangeNotify each,
-// a second after the last of a burst, in ordinal order.
+// Guards the notify window: a path lost or told twice, a burst not held for a second, an order not ordinal.
 #include <windows.h>
 #include <shlobj.h>
 

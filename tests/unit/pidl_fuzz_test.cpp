@@ -1,6 +1,4 @@
-// Random paths, names, capacities and columns through CReceiversPidlMgr. Every list and
-// every output buffer ends right before a no-access page and starts after a canary, so a
-// write or read past either end faults or shows at once. Seeded: the same inputs every run.
+// Guards item identifier code against reads or writes past any buffer on random, seeded paths, names, capacities and columns.
 #include <gtest/gtest.h>
 
 #include <cmath>

@@ -1,4 +1,4 @@
-// CReceiversPidlMgr: the bytes of the items, the path rules, the list operations and texts.
+// Guards item identifiers: wrong bytes or sizes of an item, wrong path rules, list operations or texts, leaked lists.
 #include <gtest/gtest.h>
 
 #include <cstring>

@@ -1,4 +1,4 @@
-// CCalvexReceiversQueryInfo: the tip is the item's stored text, raw, in the allocator's memory.
+// Guards the info tip: a text other than the item's stored one, or memory not from the allocator.
 #include <gtest/gtest.h>
 
 #include <string>

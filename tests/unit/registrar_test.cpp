@@ -1,5 +1,4 @@
-// The registrar against a private key: keywords, values, quoting and substitution, in both
-// directions.
+// Guards the registrar: keywords, values, quoting or substitution misread, keys removed that are not ours, malformed scripts that write.
 #include <windows.h>
 
 #include <string>

@@ -1,6 +1,4 @@
-// The module's resources as the rest of the system loads them: texts by id, icons at each
-// size, the dialog templates with their controls, the animation, the type library, the
-// image lists built at load.
+// Guards the module's resources: a missing or wrong text, icon size, dialog control, animation, type library or image list.
 #include <windows.h>
 #include <commctrl.h>
 #include <oleauto.h>

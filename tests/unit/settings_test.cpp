@@ -1,4 +1,4 @@
-// "Display Settings": what a stored value of each length gives at load, what unload writes.
+// Guards "Display Settings": a stored value of any length misread at load, or the wrong bytes written at unload.
 #include <windows.h>
 
 #include <gtest/gtest.h>

@@ -1,5 +1,4 @@
-// A folder's update path: DoUpdateList tells the notify window at once and the folder's
-// registered views five seconds after the last request, unless a view has refreshed.
+// Guards a folder's update path: the notify window not told at once, views refreshed early, twice or not at all.
 #include <windows.h>
 #include <shlobj.h>
 

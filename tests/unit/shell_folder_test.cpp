@@ -1,5 +1,4 @@
-// The folder's answers about items, without a device manager: parsing, comparing, names,
-// attributes, identity, and the operations it refuses.
+// Guards the folder's answers without a device manager: wrong parse, compare, name, attribute or identity results, operations not refused.
 #include <windows.h>
 #include <shlobj.h>
 

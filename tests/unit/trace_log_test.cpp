@@ -1,5 +1,4 @@
-// The trace file: entry layout, the narrow and wide entry points, whole entries under
-// concurrent writers.
+// Guards the trace file: a wrong entry layout, narrow or wide text mangled, entries torn by concurrent writers.
 #include <windows.h>
 
 #include <regex>
