@@ -86,15 +86,46 @@ walk_brand() {
     else bad "$brand: no row for $name with a size and a time"; fi
   done <<<"$files"
   grep -q "Invalid DateTime" <<<"$view" && bad "$brand: a time did not convert" || ok
+  [ -n "$copy_from" ] && copy_all "$copy_from"
   # Back to My Computer: the toolbar's Up button, twice.
   xdotool mousemove 81 40 click 1; sleep 1.5
   xdotool mousemove 81 40 click 1; sleep 1.5
 }
 
+# Copies every file of the open receiver as a user does (select all, right-click menu, Copy),
+# pastes them with calvex-paste and compares each with the receiver's own file: bytes and time.
+copy_all() {
+  local folder=$1 target
+  target=$(mktemp -d)
+  click_list 400 400
+  xdotool key Home shift+End; sleep 0.5
+  xdotool key shift+F10; sleep 1  # the menu opens at the top left: a keyboard menu has no point
+  import -window root "$shots/copy-menu.png"
+  xdotool key c; sleep 1
+  local out
+  out=$("$run" "$build/calvex-paste.exe" "$(winepath -w "$target" 2>/dev/null)" 2>/dev/null | tr -d '\r')
+  echo "$out"
+  local file name
+  for file in "$folder"/*; do
+    name=$(basename "$file")
+    [ "$name" = receiver.ini ] && continue
+    local copied="$target/$name.qpr"
+    if cmp -s "$file" "$copied"; then ok; else bad "copied $name.qpr differs from the receiver's file or is missing"; fi
+    local when
+    when=$(sed -n "s/^$name=//p" "$folder/receiver.ini")
+    if [ -n "$when" ] && [ "$(stat -c %Y "$copied" 2>/dev/null)" = "$(date -u -d "$when" +%s)" ]; then ok
+    else bad "copied $name.qpr does not carry the time $when"; fi
+  done
+  [ "$(ls -A "$target" | grep -c 'calvex-partial')" -eq 0 ] && ok || bad "a temporary file was left in the target"
+  rm -rf "$target"
+}
+
 click_list 400 300
 open_item "My"
 sleep 2
+copy_from="$(dirname "$0")/../../sample-receivers/Calvex Q9 USB"
 walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
+copy_from=""
 walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
 
 [ $fail -eq 0 ] || { echo "--- the namespace"; echo "$tree"; echo "--- the last view"; echo "$view"; }

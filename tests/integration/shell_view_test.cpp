@@ -338,6 +338,7 @@ TEST_F(ShellViewTest, ModeComesFromOurPreviousViewElseFromTheStreamsFirstFourByt
 TEST_F(ShellViewTest, MenusAreMergedWithTheirPositionsAndStates) {
     ComPtr<IShellFolder> root = RootFolder();
     ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
+    ASSERT_TRUE(receiver) << "the sample tree has a receiver";
     struct Case {
         const char* name;
         IShellFolder* folder;
