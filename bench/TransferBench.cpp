@@ -65,6 +65,13 @@ ULONGLONG StreamSize(IStream* stream) {
     return stream && SUCCEEDED(stream->Stat(&stat, STATFLAG_NONAME)) ? stat.cbSize.QuadPart : 0;
 }
 
+void WriteWhole(const std::wstring& path, const std::string& text) {
+    UniqueFile out(CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
+    DWORD written = 0;
+    WriteFile(out.Get(), text.data(), static_cast<DWORD>(text.size()), &written, nullptr);
+}
+
+// Written in 1 MiB pieces, so that the peak working set is the downloads' own.
 std::wstring MakeTree(size_t bytes) {
     wchar_t temp[MAX_PATH];
     GetTempPathW(MAX_PATH, temp);
@@ -72,14 +79,14 @@ std::wstring MakeTree(size_t bytes) {
     const std::wstring folder = root + L"\\Calvex A";
     CreateDirectoryW(root.c_str(), nullptr);
     CreateDirectoryW(folder.c_str(), nullptr);
-    const std::string ini = "[Receiver]\r\nBrand=1\r\nLabel=Bench\r\nSerialNumber=9000-0001\r\nModel=Q9\r\nPortType=2\r\n";
-    std::vector<char> data(bytes);
-    for (size_t i = 0; i < bytes; ++i) data[i] = static_cast<char>((i * 2654435761u) >> 13);
-    for (const auto& file : {std::make_pair(folder + L"\\receiver.ini", std::string(ini)),
-                             std::make_pair(folder + L"\\BIG", std::string(data.begin(), data.end()))}) {
-        UniqueFile out(CreateFileW(file.first.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
+    WriteWhole(folder + L"\\receiver.ini",
+               "[Receiver]\r\nBrand=1\r\nLabel=Bench\r\nSerialNumber=9000-0001\r\nModel=Q9\r\nPortType=2\r\n");
+    UniqueFile out(CreateFileW((folder + L"\\BIG").c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
+    std::vector<char> piece(1 << 20);
+    for (size_t done = 0; done < bytes; done += piece.size()) {
+        for (size_t i = 0; i < piece.size(); ++i) piece[i] = static_cast<char>(((done + i) * 2654435761u) >> 13);
         DWORD written = 0;
-        WriteFile(out.Get(), file.second.data(), static_cast<DWORD>(file.second.size()), &written, nullptr);
+        WriteFile(out.Get(), piece.data(), static_cast<DWORD>(piece.size()), &written, nullptr);
     }
     return root;
 }
@@ -158,6 +165,7 @@ int main(int argc, char** argv) {
         std::printf("the simulator did not start\n");
         return 2;
     }
+    std::printf("peak working set before the downloads %.1f MiB\n", PeakMiB());
     struct Run {
         const char* name;
         ULONGLONG (*download)();
