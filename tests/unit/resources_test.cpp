@@ -1,14 +1,12 @@
-// Guards the module's resources: a missing or wrong text, icon size, dialog control, animation, type library or image list.
+// Guards the module's resources: a missing or wrong text, icon, dialog control or image list.
 #include <windows.h>
 #include <commctrl.h>
-#include <oleauto.h>
 
 #include <string>
 #include <vector>
 
 #include <gtest/gtest.h>
 
-#include "module/ClassIds.h"
 #include "module/ModuleApp.h"
 #include "resources/resource.h"
 
@@ -33,17 +31,7 @@ std::vector<BYTE> IconPixels(WORD id, int size) {
     return pixels;
 }
 
-std::wstring ControlText(HWND dialog, int id) {
-    wchar_t text[128] = L"";
-    GetDlgItemTextW(dialog, id, text, 128);
-    return text;
-}
-
 INT_PTR CALLBACK NoProc(HWND, UINT, WPARAM, LPARAM) { return FALSE; }
-
-HWND NewParentWindow() {
-    return CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
-}
 }  // namespace
 
 TEST(Resources, StringTable) {
@@ -57,7 +45,7 @@ TEST(Resources, StringTable) {
         {1065, L"Brennor GNSS Receivers"}, {1120, L"Refresh"}, {1121, L"Select"}, {1122, L"Open"},
         {55296, L""},  // absent on purpose: the time text falls back to its own default
     };
-    for (const auto& s : strings) EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id;
+    for (const auto& s : strings) { EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id; }
 }
 
 TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
@@ -75,68 +63,29 @@ TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
 }
 
 TEST(Resources, DialogTemplatesHoldTheirControls) {
-    struct { WORD dialog; int control; const wchar_t* text; } controls[] = {
-        {IDD_PROGRESS, IDCANCEL, L"Cancel"},
+    struct { WORD dialog; int control; const wchar_t* text; } controls[] = {  // control 0: the caption
+        {IDD_PROGRESS, 0, L"Progress..."},             {IDD_PROGRESS, IDCANCEL, L"Cancel"},
         {IDD_PROGRESS, IDC_PROGRESS_STATUS, L"Waiting for download..."},
-        {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},
-        {IDD_FIND, IDCANCEL, L"Stop"},
-        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},
-        {IDD_FIND, IDC_FIND_STATIC, L""},
+        {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},         {IDD_FIND, IDCANCEL, L"Stop"},
+        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},    {IDD_FIND, IDC_FIND_STATIC, L""},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_RECEIVER, L"Receiver:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_MODEL, L"Model:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_SERIAL, L"ID:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_PORT, L"Port:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
+        {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""}, {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
     };
-    HWND parent = NewParentWindow();
+    HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
     for (const auto& c : controls) {
         HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, NoProc, 0);
         ASSERT_NE(nullptr, dialog) << c.dialog;
-        EXPECT_NE(nullptr, GetDlgItem(dialog, c.control)) << c.dialog << "/" << c.control;
-        EXPECT_EQ(c.text, ControlText(dialog, c.control)) << c.dialog << "/" << c.control;
+        HWND control = c.control ? GetDlgItem(dialog, c.control) : dialog;
+        wchar_t text[128] = L"";
+        GetWindowTextW(control, text, 128);
+        EXPECT_NE(nullptr, control) << c.dialog << "/" << c.control;
+        EXPECT_STREQ(c.text, text) << c.dialog << "/" << c.control;
         DestroyWindow(dialog);
     }
-    HWND progress = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(IDD_PROGRESS), parent, NoProc, 0);
-    wchar_t caption[64] = L"";
-    GetWindowTextW(progress, caption, 64);
-    EXPECT_STREQ(L"Progress...", caption);
-    wchar_t className[64] = L"";
-    GetClassNameW(GetDlgItem(progress, IDC_PROGRESS_BAR), className, 64);
-    EXPECT_STREQ(PROGRESS_CLASSW, className);
-    DestroyWindow(progress);
     DestroyWindow(parent);
-}
-
-TEST(Resources, SearchingClipPlaysInTheAnimationControl) {
-    HWND parent = NewParentWindow();
-    HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(IDD_FIND), parent, NoProc, 0);
-    ASSERT_NE(nullptr, dialog);
-    HWND animation = GetDlgItem(dialog, IDC_FIND_ANIMATION);
-    ASSERT_NE(nullptr, animation);
-    // Windows' control opens the clip named in the template and auto-plays it; Wine's does
-    // not open it by name, so open it as the template does and check that it plays.
-    ASSERT_TRUE(SendMessageW(animation, ACM_OPENW, reinterpret_cast<WPARAM>(ModuleInstance()),
-                             reinterpret_cast<LPARAM>(MAKEINTRESOURCEW(IDR_FIND_AVI))));
-    EXPECT_TRUE(SendMessageW(animation, ACM_PLAY, static_cast<WPARAM>(-1), MAKELPARAM(0, 0xFFFF)));
-    DestroyWindow(dialog);
-    DestroyWindow(parent);
-}
-
-TEST(Resources, TypeLibraryIsTheModules) {
-    wchar_t path[MAX_PATH];
-    GetModuleFileNameW(ModuleInstance(), path, MAX_PATH);
-    ITypeLib* library = nullptr;
-    ASSERT_EQ(S_OK, LoadTypeLibEx(path, REGKIND_NONE, &library));
-    TLIBATTR* attributes = nullptr;
-    ASSERT_EQ(S_OK, library->GetLibAttr(&attributes));
-    EXPECT_TRUE(IsEqualGUID(LIBID_CalvexReceiversShellExtLib, attributes->guid));
-    EXPECT_EQ(1, attributes->wMajorVerNum);
-    library->ReleaseTLibAttr(attributes);
-    ITypeInfo* folder = nullptr;
-    EXPECT_EQ(S_OK, library->GetTypeInfoOfGuid(CLSID_BrennorReceiversShellFolder, &folder));
-    if (folder) folder->Release();
-    library->Release();
 }
 
 TEST(Resources, ImageListsHoldSixImagesAtSystemSizes) {
