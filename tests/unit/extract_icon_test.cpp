@@ -33,14 +33,6 @@ std::vector<DWORD> Pixels(HICON icon, int cx, int cy) {
     return pixels;
 }
 
-long Distance(const std::vector<DWORD>& a, const std::vector<DWORD>& b) {
-    long sum = 0;
-    for (size_t i = 0; i < a.size(); ++i)
-        for (int shift = 0; shift < 24; shift += 8)
-            sum += std::abs(static_cast<int>((a[i] >> shift) & 0xFF) - static_cast<int>((b[i] >> shift) & 0xFF));
-    return sum;
-}
-
 // The icon resource among 101..104 whose picture is nearest to the icon.
 int NearestResource(HICON icon, int cx, int cy) {
     const std::vector<DWORD> pixels = Pixels(icon, cx, cy);
@@ -49,8 +41,11 @@ int NearestResource(HICON icon, int cx, int cy) {
     for (int id : {IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE}) {
         HICON loaded = static_cast<HICON>(
             LoadImageW(GetModuleHandleW(nullptr), MAKEINTRESOURCEW(id), IMAGE_ICON, cx, cy, LR_CREATEDIBSECTION));
-        const long distance = Distance(pixels, Pixels(loaded, cx, cy));
+        const std::vector<DWORD> other = Pixels(loaded, cx, cy);
         DestroyIcon(loaded);
+        long distance = 0;  // summed over the colour channels
+        for (size_t i = 0; i < pixels.size() * 4; ++i)
+            distance += std::abs(reinterpret_cast<const BYTE*>(pixels.data())[i] - reinterpret_cast<const BYTE*>(other.data())[i]);
         if (best < 0 || distance < best) best = distance, nearest = id;
     }
     return nearest;
@@ -73,25 +68,17 @@ protected:
 };
 
 TEST_F(ExtractIconTest, IndexIsTheLastItemKindLessOne) {
-    const struct {
-        UniquePidl list;
-        int index;
-    } cases[] = {
-        {List({{1, L"Calvex Receivers"}}), 0},
-        {List({{2, L"Calvex Receivers"}}), 1},
-        {List({{3, L"1!M!COM3"}}), 2},
-        {List({{4, L"1!M!COM3"}}), 3},
-        {List({{6, L"FILE.qpr"}}), 5},
+    const struct { UniquePidl list; int index; } cases[] = {
+        {List({{1, L"Calvex Receivers"}}), 0}, {List({{2, L"Calvex Receivers"}}), 1}, {List({{3, L"1!M!COM3"}}), 2},
+        {List({{4, L"1!M!COM3"}}), 3},         {List({{6, L"FILE.qpr"}}), 5},
         {List({{2, L"Calvex Receivers"}, {4, L"1!M!COM3"}, {6, L"FILE.qpr"}}), 5},
     };
     for (const auto& c : cases) {
         ComObject<CCalvexReceiversExtractIcon>* object = nullptr;
         ASSERT_EQ(CreateComObject<CCalvexReceiversExtractIcon>(&object), S_OK);
         ASSERT_EQ(object->SetItem(c.list.Get()), S_OK);
-        wchar_t location[16];
-        wmemset(location, L'#', 16);
-        wchar_t before[16];
-        wmemcpy(before, location, 16);
+        wchar_t location[16], before[16];
+        wmemset(location, L'#', 16), wmemset(before, L'#', 16);
         int index = -7;
         UINT flags = 0;
         EXPECT_EQ(object->GetIconLocation(GIL_FORSHELL, location, 16, &index, &flags), S_OK);
