@@ -43,23 +43,9 @@ DWORD WINAPI CloseBox(void* param) {
 }
 }  // namespace
 
-TEST(ContextMenu, OffersIContextMenuOnly) {
-    ComPtr<IContextMenu> menu = NewMenu();
-    ASSERT_TRUE(menu);
-    const IID* refused[] = {&IID_IContextMenu2, &IID_IContextMenu3, &IID_IShellExtInit, &IID_IDispatch};
-    for (const IID* iid : refused) {
-        void* other = reinterpret_cast<void*>(1);
-        EXPECT_EQ(E_NOINTERFACE, menu->QueryInterface(*iid, &other));
-        EXPECT_EQ(nullptr, other);
-    }
-}
-
 TEST(ContextMenu, QueryContextMenuAddsOneItemUnlessDefaultOnly) {
     struct { UINT flags; HRESULT result; int items; } cases[] = {
-        {CMF_DEFAULTONLY, 0, 0},
-        {CMF_DEFAULTONLY | CMF_EXPLORE, 0, 0},
-        {CMF_NORMAL, 1, 1},
-        {CMF_EXPLORE, 1, 1},
+        {CMF_DEFAULTONLY, 0, 0}, {CMF_DEFAULTONLY | CMF_EXPLORE, 0, 0}, {CMF_NORMAL, 1, 1}, {CMF_EXPLORE, 1, 1},
         {CMF_CANRENAME | CMF_VERBSONLY, 1, 1},
     };
     ComPtr<IContextMenu> menu = NewMenu();
@@ -80,69 +66,42 @@ TEST(ContextMenu, QueryContextMenuAddsOneItemUnlessDefaultOnly) {
     }
 }
 
-TEST(ContextMenu, GetCommandStringWritesNarrowBytes) {
-    struct {
-        UINT type;
-        UINT_PTR offset;
-        HRESULT result;
-        const char* text;  // null: buffer untouched
-    } cases[] = {
-        {GCS_VERBW, 0, S_OK, "command"},
-        {GCS_HELPTEXTW, 0, S_OK, "Explorer Bar command help text"},
-        {GCS_VERBW, 1, E_INVALIDARG, nullptr},
-        {GCS_HELPTEXTW, 1, E_INVALIDARG, nullptr},
-        {GCS_VALIDATEW, 0, S_OK, nullptr},
-        {GCS_VALIDATEW, 7, S_OK, nullptr},
-        {GCS_VERBA, 0, E_INVALIDARG, nullptr},
-        {GCS_HELPTEXTA, 0, E_INVALIDARG, nullptr},
-        {GCS_VALIDATEA, 0, E_INVALIDARG, nullptr},
+TEST(ContextMenu, GetCommandStringWritesNarrowBytesWithinTheSize) {
+    struct { UINT type; UINT_PTR offset; UINT size; HRESULT result; const char* text; } cases[] = {  // text null: untouched
+        {GCS_VERBW, 0, 64, S_OK, "command"},
+        {GCS_HELPTEXTW, 0, 64, S_OK, "Explorer Bar command help text"},
+        {GCS_HELPTEXTW, 0, 5, S_OK, "Expl"},  // the size counts bytes
+        {GCS_VERBW, 1, 64, E_INVALIDARG, nullptr},      {GCS_HELPTEXTW, 1, 64, E_INVALIDARG, nullptr},
+        {GCS_VALIDATEW, 0, 64, S_OK, nullptr},          {GCS_VALIDATEW, 7, 64, S_OK, nullptr},
+        {GCS_VERBA, 0, 64, E_INVALIDARG, nullptr},      {GCS_HELPTEXTA, 0, 64, E_INVALIDARG, nullptr},
+        {GCS_VALIDATEA, 0, 64, E_INVALIDARG, nullptr},
     };
     ComPtr<IContextMenu> menu = NewMenu();
     ASSERT_TRUE(menu);
     for (const auto& c : cases) {
-        SCOPED_TRACE(testing::Message() << "type " << c.type << " offset " << c.offset);
+        SCOPED_TRACE(testing::Message() << "type " << c.type << " offset " << c.offset << " size " << c.size);
         char buffer[128];
         memset(buffer, 0x5A, sizeof buffer);
-        EXPECT_EQ(c.result, menu->GetCommandString(c.offset, c.type, nullptr, buffer, 64));
-        if (c.text) {
-            EXPECT_EQ(0, memcmp(c.text, buffer, strlen(c.text) + 1)) << "narrow text, not UTF-16";
-        } else {
-            EXPECT_EQ(0x5A, buffer[0]);
-        }
+        EXPECT_EQ(c.result, menu->GetCommandString(c.offset, c.type, nullptr, buffer, c.size));
+        const size_t written = c.text ? strlen(c.text) + 1 : 0;
+        if (c.text) { EXPECT_EQ(0, memcmp(c.text, buffer, written)) << "narrow text, not UTF-16"; }
+        EXPECT_EQ(0x5A, buffer[written]) << "nothing written past the text";
     }
-}
-
-TEST(ContextMenu, CommandStringIsBoundedByTheSizeAsBytes) {
-    ComPtr<IContextMenu> menu = NewMenu();
-    ASSERT_TRUE(menu);
-    char buffer[32];
-    memset(buffer, 0x5A, sizeof buffer);
-    EXPECT_EQ(S_OK, menu->GetCommandString(0, GCS_HELPTEXTW, nullptr, buffer, 5));
-    EXPECT_EQ(0, memcmp("Expl", buffer, 5));
-    EXPECT_EQ(0x5A, buffer[5]) << "nothing written past five bytes";
 }
 
 TEST(ContextMenu, InvokeCommandRefusesVerbsAndShowsTheBoxForOffsetZero) {
     ComPtr<IContextMenu> menu = NewMenu();
     ASSERT_TRUE(menu);
     HWND owner = CreateWindowExW(0, L"STATIC", L"owner", WS_OVERLAPPED, 0, 0, 100, 100, nullptr, nullptr, nullptr, nullptr);
-    struct { LPCSTR verb; HRESULT result; } refused[] = {
-        {"command", E_INVALIDARG},
-        {MAKEINTRESOURCEA(1), E_INVALIDARG},
-    };
-    for (const auto& c : refused) {
-        CMINVOKECOMMANDINFO info = {sizeof info};
-        info.hwnd = owner;
-        info.lpVerb = c.verb;
-        EXPECT_EQ(c.result, menu->InvokeCommand(&info));
+    for (LPCSTR verb : {static_cast<LPCSTR>("command"), static_cast<LPCSTR>(MAKEINTRESOURCEA(1))}) {
+        CMINVOKECOMMANDINFO info = {sizeof info, 0, owner, verb};
+        EXPECT_EQ(E_INVALIDARG, menu->InvokeCommand(&info));
     }
     EXPECT_EQ(nullptr, FindWindowW(L"#32770", L"Sample Explorer Bar"));
 
     Box box;
     HANDLE closer = CreateThread(nullptr, 0, CloseBox, &box, 0, nullptr);
-    CMINVOKECOMMANDINFO info = {sizeof info};
-    info.hwnd = owner;
-    info.lpVerb = MAKEINTRESOURCEA(0);
+    CMINVOKECOMMANDINFO info = {sizeof info, 0, owner, MAKEINTRESOURCEA(0)};
     EXPECT_EQ(S_OK, menu->InvokeCommand(&info));
     EXPECT_EQ(WAIT_OBJECT_0, WaitForSingleObject(closer, 15000));
     CloseHandle(closer);

@@ -71,32 +71,20 @@ protected:
     FileEventsSink* sink = nullptr;
 };
 
-VARIANT Dispatch(IDispatch* value) {
-    VARIANT v;
-    v.vt = VT_DISPATCH;
-    v.pdispVal = value;
-    return v;
-}
-VARIANT Int(VARTYPE type, LONG value) {
-    VARIANT v;
+VARIANT Arg(VARTYPE type, LONG value, IDispatch* object = nullptr, const wchar_t* text = nullptr) {
+    VARIANT v = {};
     v.vt = type;
-    v.lVal = 0;
-    if (type == VT_I2) v.iVal = static_cast<SHORT>(value); else v.lVal = value;
-    return v;
-}
-VARIANT Text(const wchar_t* text) {
-    VARIANT v;
-    v.vt = VT_BSTR;
-    v.bstrVal = SysAllocString(text);  // freed by Invoke() above
+    if (type == VT_DISPATCH) v.pdispVal = object;
+    else if (type == VT_BSTR) v.bstrVal = SysAllocString(text);  // freed by Invoke() above
+    else if (type == VT_I2) v.iVal = static_cast<SHORT>(value);
+    else v.lVal = value;
     return v;
 }
 }  // namespace
 
 TEST_F(DispEventSinkTest, AnswersItsThreeInterfacesOnly) {
-    struct { const IID* iid; HRESULT result; } cases[] = {
-        {&IID_IUnknown, S_OK}, {&IID_IDispatch, S_OK}, {&DIID__IReceiverFileEvents, S_OK},
-        {&DIID__IFilesCollEvents, E_NOINTERFACE}, {&IID_IConnectionPoint, E_NOINTERFACE},
-    };
+    struct { const IID* iid; HRESULT result; } cases[] = {{&IID_IUnknown, S_OK}, {&IID_IDispatch, S_OK},
+        {&DIID__IReceiverFileEvents, S_OK}, {&DIID__IFilesCollEvents, E_NOINTERFACE}, {&IID_IConnectionPoint, E_NOINTERFACE}};
     for (const auto& c : cases) {
         void* object = reinterpret_cast<void*>(1);
         EXPECT_EQ(c.result, sink->QueryInterface(*c.iid, &object));
@@ -145,36 +133,29 @@ TEST_F(DispEventSinkTest, CookieRuleAndADownloadsEvents) {
 
 TEST_F(DispEventSinkTest, InvokeCoercesToTheLibrarysTypesInDeclarationOrder) {
     IDispatch* file = sink;  // any dispatch pointer stands for the file
-    struct {
-        DISPID dispid;
-        std::vector<VARIANT> rgvarg;  // last argument first, as callers pass them
-        int handler;
-        std::vector<VARTYPE> types;
-        LONG number;
-    } cases[] = {
-        {1, {Dispatch(file)}, 1, {VT_DISPATCH}, 0},
-        {2, {Int(VT_I4, 50), Dispatch(file)}, 2, {VT_DISPATCH, VT_UI1}, 50},
-        {2, {Text(L"75"), Dispatch(file)}, 2, {VT_DISPATCH, VT_UI1}, 75},
-        {3, {Int(VT_I2, -5), Dispatch(file)}, 3, {VT_DISPATCH, VT_I4}, -5},
-        {3, {Int(VT_I4, static_cast<LONG>(E_ABORT)), Dispatch(file)}, 3, {VT_DISPATCH, VT_I4}, static_cast<LONG>(E_ABORT)},
+    struct { DISPID dispid; std::vector<VARIANT> rgvarg; int handler; std::vector<VARTYPE> types; LONG number; } cases[] = {
+        // rgvarg: last argument first, as callers pass them
+        {1, {Arg(VT_DISPATCH, 0, file)}, 1, {VT_DISPATCH}, 0},
+        {2, {Arg(VT_I4, 50), Arg(VT_DISPATCH, 0, file)}, 2, {VT_DISPATCH, VT_UI1}, 50},
+        {2, {Arg(VT_BSTR, 0, nullptr, L"75"), Arg(VT_DISPATCH, 0, file)}, 2, {VT_DISPATCH, VT_UI1}, 75},
+        {3, {Arg(VT_I2, -5), Arg(VT_DISPATCH, 0, file)}, 3, {VT_DISPATCH, VT_I4}, -5},
+        {3, {Arg(VT_I4, E_ABORT), Arg(VT_DISPATCH, 0, file)}, 3, {VT_DISPATCH, VT_I4}, static_cast<LONG>(E_ABORT)},
     };
     for (auto& c : cases) {
         SCOPED_TRACE(c.dispid);
         sink->calls.clear();
         ASSERT_EQ(S_OK, Invoke(c.dispid, c.rgvarg));
         ASSERT_EQ(1u, sink->calls.size());
-        EXPECT_EQ(c.handler, sink->calls[0].handler);
-        EXPECT_EQ(c.types, sink->calls[0].types);
-        EXPECT_EQ(file, sink->calls[0].file);
-        EXPECT_EQ(c.number, sink->calls[0].number);
+        const Call& call = sink->calls[0];
+        EXPECT_TRUE(c.handler == call.handler && c.types == call.types && file == call.file && c.number == call.number);
     }
 }
 
 TEST_F(DispEventSinkTest, InvokeRefusesWhatTheLibraryDoesNotDeclare) {
     IDispatch* file = sink;
     UINT argErr = 99;
-    EXPECT_EQ(DISP_E_BADPARAMCOUNT, Invoke(2, {Dispatch(file)}));
-    EXPECT_EQ(DISP_E_TYPEMISMATCH, Invoke(2, {Text(L"many"), Dispatch(file)}, &argErr));
+    EXPECT_EQ(DISP_E_BADPARAMCOUNT, Invoke(2, {Arg(VT_DISPATCH, 0, file)}));
+    EXPECT_EQ(DISP_E_TYPEMISMATCH, Invoke(2, {Arg(VT_BSTR, 0, nullptr, L"many"), Arg(VT_DISPATCH, 0, file)}, &argErr));
     EXPECT_EQ(0u, argErr) << "index into rgvarg of the bad argument";
     EXPECT_EQ(S_OK, Invoke(99, {})) << "events nobody listens to are ignored";
     EXPECT_TRUE(sink->calls.empty());

@@ -65,11 +65,14 @@ protected:
         return FilesOf(ReceiverAt(Receivers({Rx(L"R", 1, std::move(lines))}, files).Get(), 0).Get());
     }
 
+    // Made and initialised; null (and gone) when Init fails. `failAfter` allocations succeed first.
     ComObject<CCalvexReceiversEnumIDList>* Make(const wchar_t* path, DWORD flags, IUnknown* coll, DWORD brand,
-                                                HRESULT* hr) {
+                                                HRESULT* hr, int failAfter = -1) {
         ComObject<CCalvexReceiversEnumIDList>* enumerator = nullptr;
         EXPECT_EQ(CreateComObject<CCalvexReceiversEnumIDList>(&enumerator, &malloc), S_OK);
+        malloc.FailAfter(failAfter);
         enumerator->Init(path, flags, coll, brand, hr);
+        malloc.FailAfter(-1);
         return SUCCEEDED(*hr) ? enumerator : nullptr;
     }
     std::vector<Item> Drain(IEnumIDList* enumerator) {
@@ -88,10 +91,9 @@ protected:
     std::vector<Item> Enumerate(const std::wstring& path, DWORD flags, IUnknown* coll, DWORD brand) {
         HRESULT hr = E_FAIL;
         ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(path.c_str(), flags, coll, brand, &hr);
+        std::vector<Item> items = enumerator ? Drain(enumerator) : std::vector<Item>{};
+        if (enumerator) enumerator->Release();
         EXPECT_EQ(hr, S_OK);
-        if (!enumerator) return {};
-        std::vector<Item> items = Drain(enumerator);
-        enumerator->Release();
         return items;
     }
 
@@ -107,12 +109,7 @@ TEST_F(EnumIDListTest, ReceiversOfTheFolderBrandWithALabel) {
     const std::vector<ReceiverSetup> mixed = {Rx(L"A"), Rx(L"B", 2), Rx(L"C")};
     ReceiverSetup unlabelled = Rx(L"A");
     unlabelled.label.clear();
-    const struct {
-        const char* what;
-        std::vector<ReceiverSetup> receivers;
-        DWORD brand;
-        std::vector<Item> expected;
-    } cases[] = {
+    const struct { const char* what; std::vector<ReceiverSetup> receivers; DWORD brand; std::vector<Item> expected; } cases[] = {
         {"brand 1 of three", mixed, 1, {{3, L"A!M1!COM3"}, {3, L"C!M1!COM3"}}},
         {"brand 2 of three", mixed, 2, {{4, L"B!M1!COM3"}}},
         {"brand S_FALSE", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Brand=1"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
@@ -127,24 +124,12 @@ TEST_F(EnumIDListTest, ReceiversOfTheFolderBrandWithALabel) {
         {"port unknown", {Rx(L"A", 1, {}, L"M1", 7)}, 1, {{3, L"A!M1!Unknown"}}},
         {"brand 7 folder", mixed, 7, {}},
     };
-    for (const auto& c : cases) EXPECT_EQ(Enumerate(kRoot, kFolders, Receivers(c.receivers).Get(), c.brand), c.expected) << c.what;
-}
-
-TEST_F(EnumIDListTest, PortNameIsReadForNamedPortsOnly) {
-    for (long portType : {1L, 2L, 7L}) {
-        Enumerate(kRoot, kFolders, Receivers({Rx(L"A", 1, {}, L"M1", portType)}).Get(), 1);
-        EXPECT_EQ(SimModel::Acquire(m_trees.back()->Root())->CallCount(L"IReceiver.get_PortName"), portType == 1 ? 1 : 0)
-            << "port type " << portType;
-    }
+    for (const auto& c : cases) { EXPECT_EQ(Enumerate(kRoot, kFolders, Receivers(c.receivers).Get(), c.brand), c.expected) << c.what; }
 }
 
 TEST_F(EnumIDListTest, FilesGetQprForBrandOneAndTheHvl3FamilyOnly) {
     ComPtr<IFilesColl> files = Files({{L"LOG1", 10}});
-    const struct {
-        const wchar_t* path;
-        DWORD brand;
-        const wchar_t* expected;
-    } cases[] = {
+    const struct { const wchar_t* path; DWORD brand; const wchar_t* expected; } cases[] = {
         {L"Calvex Receivers\\1!M1!COM3", 1, L"LOG1.qpr"},    {L"Calvex Receivers\\1", 1, L"LOG1.qpr"},
         {L"Calvex Receivers\\1!HVL3xxx!USB", 2, L"LOG1.qpr"}, {L"Calvex Receivers\\1!HVL3!USB", 2, L"LOG1.qpr"},
         {L"Calvex Receivers\\1!HVL3#2!USB", 2, L"LOG1.qpr"},  {L"Calvex Receivers\\1!HVL!USB", 2, L"LOG1"},
@@ -170,19 +155,14 @@ TEST_F(EnumIDListTest, FilesCarrySizeAndTimeInCollectionOrder) {
 TEST_F(EnumIDListTest, CollectionsAndFlagsThatListNothing) {
     ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A")});
     ComPtr<IFilesColl> files = Files({{L"LOG1", 1}});
-    const struct {
-        const char* what;
-        const wchar_t* path;
-        DWORD flags;
-        IUnknown* coll;
-    } cases[] = {
+    const struct { const char* what; const wchar_t* path; DWORD flags; IUnknown* coll; } cases[] = {
         {"no collection", kRoot, kFolders | kFiles, nullptr},
         {"receivers wanted of a files collection", kRoot, kFolders, files.Get()},
         {"files wanted of a receivers collection", kRoot, kFiles, receivers.Get()},
         {"neither flag", kRoot, SHCONTF_INCLUDEHIDDEN, receivers.Get()},
         {"neither flag, path of separators", L"\\\\//", 0, receivers.Get()},
     };
-    for (const auto& c : cases) EXPECT_TRUE(Enumerate(c.path, c.flags, c.coll, 1).empty()) << c.what;
+    for (const auto& c : cases) { EXPECT_TRUE(Enumerate(c.path, c.flags, c.coll, 1).empty()) << c.what; }
     // An empty folder path passes the component check through the default root name, but
     // the items are made from the path as given: "\key" makes a root-kind item.
     EXPECT_EQ(Enumerate(L"", kFolders, receivers.Get(), 1), (std::vector<Item>{{1, L"A!M1!COM3"}}));
@@ -203,17 +183,12 @@ TEST_F(EnumIDListTest, FailuresDestroyTheEnumerator) {
         {"item allocation: skipped", kRoot, kFolders, 0, S_OK},
     };
     for (const auto& c : cases) {
-        ComObject<CCalvexReceiversEnumIDList>* enumerator = nullptr;
-        ASSERT_EQ(CreateComObject<CCalvexReceiversEnumIDList>(&enumerator, &malloc), S_OK);
-        malloc.FailAfter(c.allocations);
         HRESULT hr = E_FAIL;
-        enumerator->Init(c.path, c.flags, receivers.Get(), 1, &hr);
-        malloc.FailAfter(-1);
-        EXPECT_EQ(hr, c.expected) << c.what;
-        if (SUCCEEDED(hr)) {
+        if (auto* enumerator = Make(c.path, c.flags, receivers.Get(), 1, &hr, c.allocations)) {
             EXPECT_TRUE(Drain(enumerator).empty()) << c.what;
             enumerator->Release();
         }
+        EXPECT_EQ(hr, c.expected) << c.what;
         EXPECT_EQ(malloc.HeldReferences(), baseRefs) << c.what << ": the enumerator must be gone";
     }
 }
@@ -226,31 +201,23 @@ TEST_F(EnumIDListTest, NextSkipResetClone) {
     IEnumIDList* e = enumerator;
     PITEMID_CHILD out[3] = {};
     ULONG fetched = 99;
-    auto freeOut = [&] {
-        for (PITEMID_CHILD& pidl : out) mgr.Delete(pidl), pidl = nullptr;
+    // Each step: Reset first?, the count asked, whether fetched is passed, the answer, and the names got.
+    const struct { bool reset; ULONG count; bool withFetched; HRESULT expected; std::wstring names; } steps[] = {
+        {false, 3, true, S_FALSE, L"A!M1!COM3|B!M1!COM3|"}, {false, 3, true, S_FALSE, L""},
+        {true, 2, false, E_INVALIDARG, L""},  {false, 1, false, S_OK, L"A!M1!COM3|"},  // the refusal moved nothing
+        {false, 0, true, S_OK, L""},
     };
+    for (const auto& step : steps) {
+        if (step.reset) { EXPECT_EQ(e->Reset(), S_OK); }
+        fetched = 99;
+        EXPECT_EQ(e->Next(step.count, out, step.withFetched ? &fetched : nullptr), step.expected);
+        std::wstring names;
+        for (PITEMID_CHILD& pidl : out) names += pidl ? mgr.GetItemName(pidl) + L"|" : L"", mgr.Delete(pidl), pidl = nullptr;
+        EXPECT_EQ(names, step.names);
+        if (step.withFetched) { EXPECT_EQ(fetched, static_cast<ULONG>(std::count(names.begin(), names.end(), L'|'))); }
+    }
 
-    EXPECT_EQ(e->Next(3, out, &fetched), S_FALSE);
-    EXPECT_EQ(fetched, 2u);
-    EXPECT_EQ(mgr.GetItemName(out[0]), L"A!M1!COM3");
-    EXPECT_EQ(mgr.GetItemName(out[1]), L"B!M1!COM3");
-    freeOut();
-    EXPECT_EQ(e->Next(3, out, &fetched), S_FALSE);
-    EXPECT_EQ(fetched, 0u);
-
-    EXPECT_EQ(e->Reset(), S_OK);
-    EXPECT_EQ(e->Next(2, out, nullptr), E_INVALIDARG);
-    EXPECT_EQ(e->Next(1, out, nullptr), S_OK);
-    EXPECT_EQ(mgr.GetItemName(out[0]), L"A!M1!COM3") << "the refused call moved nothing";
-    freeOut();
-    EXPECT_EQ(e->Next(0, out, &fetched), S_OK);
-    EXPECT_EQ(fetched, 0u);
-
-    const struct {
-        ULONG skip;
-        HRESULT expected;
-        ULONG left;
-    } skips[] = {{0, S_OK, 2}, {1, S_OK, 1}, {2, S_OK, 0}, {3, S_FALSE, 0}};
+    const struct { ULONG skip; HRESULT expected; ULONG left; } skips[] = {{0, S_OK, 2}, {1, S_OK, 1}, {2, S_OK, 0}, {3, S_FALSE, 0}};
     for (const auto& s : skips) {
         e->Reset();
         EXPECT_EQ(e->Skip(s.skip), s.expected) << "skip " << s.skip;
@@ -259,7 +226,7 @@ TEST_F(EnumIDListTest, NextSkipResetClone) {
 
     IEnumIDList* clone = reinterpret_cast<IEnumIDList*>(1);
     EXPECT_EQ(e->Clone(&clone), E_NOTIMPL);
-    EXPECT_EQ(clone, nullptr);
+    EXPECT_FALSE(clone);
 
     // A copy that cannot be made still counts: the slot is null and the cursor moves on.
     e->Reset();
@@ -267,36 +234,32 @@ TEST_F(EnumIDListTest, NextSkipResetClone) {
     EXPECT_EQ(e->Next(2, out, &fetched), S_OK);
     malloc.FailAfter(-1);
     EXPECT_EQ(fetched, 2u);
-    EXPECT_EQ(out[0], nullptr);
-    EXPECT_EQ(out[1], nullptr);
+    EXPECT_TRUE(!out[0] && !out[1]);
     EXPECT_EQ(e->Next(1, out, &fetched), S_FALSE);
     enumerator->Release();
 }
 
 TEST_F(EnumIDListTest, TraceLines) {
     ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A"), Rx(L"B", 2), Rx(L"C")});
+    ComPtr<IFilesColl> files = Files({{L"F1", 1}, {L"F2", 1}});
     HRESULT hr = E_FAIL;
-    ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(kRoot, kFolders | kFiles, receivers.Get(), 2, &hr);
-    ASSERT_TRUE(enumerator);
+    auto* folders = Make(kRoot, kFolders | kFiles, receivers.Get(), 2, &hr);
+    auto* filesEnum = Make(L"Calvex Receivers\\1!M!P", kFiles, files.Get(), 1, &hr);
+    ASSERT_TRUE(folders && filesEnum);
     char expected[3][160];
     _snprintf(expected[0], 160, "CCalvexReceiversEnumIDList::CreateEnumList(Calvex Receivers, 96, 0x%08X, 2)\r\n",
               static_cast<unsigned>(reinterpret_cast<uintptr_t>(static_cast<IUnknown*>(receivers.Get()))));
     _snprintf(expected[1], 160, "CCalvexReceiversEnumIDList::CreateEnumList - receivers:3 %p\r\n",
-              static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(enumerator)));
-    enumerator->Release();
-
-    enumerator = Make(L"Calvex Receivers\\1!M!P", kFiles, Files({{L"F1", 1}, {L"F2", 1}}).Get(), 1, &hr);
-    ASSERT_TRUE(enumerator);
+              static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(folders)));
     _snprintf(expected[2], 160, "CCalvexReceiversEnumIDList::CreateEnumList - files: 2 %p\r\n",
-              static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(enumerator)));
-    enumerator->Release();
-
+              static_cast<void*>(static_cast<CCalvexReceiversEnumIDList*>(filesEnum)));
+    folders->Release();
+    filesEnum->Release();
     const std::vector<std::string> messages = TraceMessages();
-    const size_t create = static_cast<size_t>(std::find(messages.begin(), messages.end(), expected[0]) - messages.begin());
-    ASSERT_LT(create + 1, messages.size()) << expected[0];
-    ASSERT_GT(create, 0u);
-    EXPECT_EQ(messages[create - 1], "CCalvexReceiversEnumIDList::Init\r\n");
-    EXPECT_EQ(messages[create + 1], expected[1]);
+    const auto create = std::find(messages.begin(), messages.end(), expected[0]);
+    ASSERT_TRUE(create != messages.begin() && create != messages.end() && create + 1 != messages.end()) << expected[0];
+    EXPECT_EQ(create[-1], "CCalvexReceiversEnumIDList::Init\r\n");
+    EXPECT_EQ(create[1], expected[1]);
     EXPECT_TRUE(TraceContains(expected[2])) << expected[2];
     EXPECT_FALSE(TraceContains("files: 3")) << "a receivers collection lists no files";
 }

@@ -33,23 +33,18 @@ public:
     explicit GuardedBuffer(size_t capacity)
         : m_block(static_cast<wchar_t*>(GuardedMalloc::GuardedBlock((capacity + kCanaryUnits) * sizeof(wchar_t)))),
           m_capacity(capacity) {
-        for (size_t i = 0; i < capacity + kCanaryUnits; ++i) m_block[i] = kCanary;
+        wmemset(m_block, kCanary, capacity + kCanaryUnits);
     }
     ~GuardedBuffer() { GuardedMalloc::FreeGuardedBlock(m_block); }
     GuardedBuffer(const GuardedBuffer&) = delete;
     GuardedBuffer& operator=(const GuardedBuffer&) = delete;
 
     wchar_t* Get() { return m_block + kCanaryUnits; }
-    bool CanaryIntact() const {
+    // The canary is whole and the text ends inside the buffer (a buffer of 0 units holds nothing).
+    bool Sound() const {
         for (size_t i = 0; i < kCanaryUnits; ++i)
             if (m_block[i] != kCanary) return false;
-        return true;
-    }
-    // The text is terminated inside the buffer (a buffer of 0 units holds nothing).
-    bool Terminated() const {
-        for (size_t i = 0; i < m_capacity; ++i)
-            if (m_block[kCanaryUnits + i] == L'\0') return true;
-        return m_capacity == 0;
+        return m_capacity == 0 || wmemchr(m_block + kCanaryUnits, L'\0', m_capacity);
     }
 
 private:
@@ -86,12 +81,7 @@ private:
 // Components the simple way, to check the manager's splitting against.
 size_t ComponentCount(const std::wstring& path) {
     size_t count = 0;
-    bool inside = false;
-    for (wchar_t c : path) {
-        const bool separator = c == L'\\' || c == L'/';
-        if (!separator && !inside) ++count;
-        inside = !separator;
-    }
+    for (size_t i = 0; i < path.size(); ++i) count += !wcschr(L"\\/", path[i]) && (i == 0 || wcschr(L"\\/", path[i - 1]));
     return count;
 }
 
@@ -100,31 +90,22 @@ void CheckTexts(const CReceiversPidlMgr& mgr, Fuzzer& fuzz, LPCITEMIDLIST list) 
     const UINT capacity = static_cast<UINT>(fuzz.Int(0, 300));
     GuardedBuffer path(capacity);
     const UINT length = mgr.GetPath(list, path.Get(), capacity, keepKeys);
-    ASSERT_TRUE(path.CanaryIntact());
-    ASSERT_TRUE(path.Terminated());
+    ASSERT_TRUE(path.Sound());
     const UINT sized = mgr.GetPath(list, nullptr, 0, keepKeys);
     // Every text fits here (names are shorter than 1000 units, lists at most 4 items).
     GuardedBuffer full(8192);
     const UINT fullLength = mgr.GetPath(list, full.Get(), 8192, keepKeys);
-    if (fullLength > 0) {
-        ASSERT_EQ(sized, fullLength + 1);
-    }
+    if (fullLength > 0) { ASSERT_EQ(sized, fullLength + 1); }
     const std::wstring text = capacity ? path.Get() : L"";
-    if (capacity > wcslen(full.Get())) {
-        // A text that fits comes out exactly as from the large buffer.
-        ASSERT_EQ(text, full.Get());
-        ASSERT_EQ(length, fullLength);
-    } else {
-        // Otherwise what fits is a prefix of it.
-        ASSERT_EQ(std::wstring(full.Get()).compare(0, text.size(), text), 0);
-    }
+    // A text that fits comes out exactly as from the large buffer, otherwise what fits is a prefix of it.
+    ASSERT_EQ(std::wstring(full.Get()).compare(0, text.size(), text), 0);
+    if (capacity > wcslen(full.Get())) { ASSERT_EQ(text + L"|" + std::to_wstring(length), full.Get() + (L"|" + std::to_wstring(fullLength))); }
 
     for (LPCITEMIDLIST item = list; mgr.GetData(item); item = mgr.GetNextItem(item)) {
         const UINT cap = static_cast<UINT>(fuzz.Int(0, 300));
         GuardedBuffer text(cap);
         const UINT written = mgr.GetItemText(item, fuzz.Int(-1, 5), text.Get(), cap);
-        ASSERT_TRUE(text.CanaryIntact());
-        ASSERT_TRUE(text.Terminated());
+        ASSERT_TRUE(text.Sound());
         ASSERT_TRUE(cap == 0 ? written == 0 : written == wcslen(text.Get()));
     }
 }

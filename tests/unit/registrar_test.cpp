@@ -1,6 +1,7 @@
 // Guards the registrar: keywords, values, quoting or substitution misread, keys removed that are not ours, malformed scripts that write.
 #include <windows.h>
 
+#include <cwchar>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -18,16 +19,17 @@ std::wstring Script(const std::wstring& body) {
 
 bool KeyExists(const std::wstring& sub) {
     UniqueRegKey key;
-    return RegOpenKeyExW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), 0, KEY_READ, key.Put()) ==
-           ERROR_SUCCESS;
+    return !RegOpenKeyExW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), 0, KEY_READ, key.Put());
 }
 
-std::wstring StringValue(const std::wstring& sub, const wchar_t* name) {
+// The value as text ("<none>" when missing); a DWORD in hexadecimal.
+std::wstring Value(const std::wstring& sub, const wchar_t* name) {
     wchar_t text[512] = L"";
-    DWORD size = sizeof text;
-    if (RegGetValueW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), name, RRF_RT_REG_SZ, nullptr,
-                     text, &size) != ERROR_SUCCESS)
+    DWORD size = sizeof text, type = 0;
+    if (RegGetValueW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), name,
+                     RRF_RT_REG_SZ | RRF_RT_REG_DWORD, &type, text, &size))
         return L"<none>";
+    if (type == REG_DWORD) swprintf(text, 512, L"0x%08X", *reinterpret_cast<DWORD*>(text));
     return text;
 }
 
@@ -58,13 +60,10 @@ TEST_F(RegistrarTest, RegistersKeysValuesAndSubstitutions) {
         {clsid + L"\\InprocServer32", L"ThreadingModel", L"Apartment"},
         {clsid, L"InfoTip", L"It's 100% text"},
         {clsid + L"\\Key With Spaces", nullptr, L"x"},
+        {clsid, L"Number", L"0xA0000000"},
     };
-    for (const auto& e : expected) EXPECT_EQ(e.value, StringValue(e.key, e.name)) << testing::PrintToString(e.key);
+    for (const auto& e : expected) { EXPECT_EQ(e.value, Value(e.key, e.name)) << testing::PrintToString(e.key); }
     EXPECT_TRUE(KeyExists(clsid + L"\\ShellFolder"));
-    DWORD number = 0, size = sizeof number;
-    ASSERT_EQ(ERROR_SUCCESS, RegGetValueW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + clsid).c_str(), L"Number",
-                                          RRF_RT_REG_DWORD, nullptr, &number, &size));
-    EXPECT_EQ(0xA0000000u, number);
 }
 
 TEST_F(RegistrarTest, ForceRemoveReplacesOnRegistrationAndRemovesWholeOnRemoval) {
@@ -92,8 +91,8 @@ TEST_F(RegistrarTest, RemovalKeepsNoRemoveKeysAndForeignSubkeys) {
         {L"Plain\\Child", false},
         {L"Plain\\Foreign", true},
     };
-    for (const auto& a : after) EXPECT_EQ(a.exists, KeyExists(a.key)) << testing::PrintToString(std::wstring(a.key));
-    EXPECT_EQ(L"<none>", StringValue(L"Shared", L"Ours")) << "named values are removed";
+    for (const auto& a : after) { EXPECT_EQ(a.exists, KeyExists(a.key)) << testing::PrintToString(std::wstring(a.key)); }
+    EXPECT_EQ(L"<none>", Value(L"Shared", L"Ours")) << "named values are removed";
     EXPECT_EQ(S_OK, registrar.RunScript(script, false)) << "removing twice is fine";
 }
 

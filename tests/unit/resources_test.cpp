@@ -1,49 +1,60 @@
-// Guards the module's resources: a missing or wrong text, icon size, dialog control, animation, type library or image list.
+// Guards the module's resources: a missing or wrong text, icon, dialog control or image list; an item kind given the wrong icon index or picture, a location touched.
 #include <windows.h>
 #include <commctrl.h>
-#include <oleauto.h>
 
+#include <cstdlib>
 #include <string>
 #include <vector>
 
 #include <gtest/gtest.h>
 
-#include "module/ClassIds.h"
+#include "items/CCalvexReceiversExtractIcon.h"
+#include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "resources/resource.h"
 
 namespace {
-std::vector<BYTE> IconPixels(WORD id, int size) {
-    HICON icon = static_cast<HICON>(LoadImageW(ModuleInstance(), MAKEINTRESOURCEW(id), IMAGE_ICON, size, size, 0));
+HICON ModuleIcon(WORD id, int size) {
+    return static_cast<HICON>(LoadImageW(ModuleInstance(), MAKEINTRESOURCEW(id), IMAGE_ICON, size, size, LR_CREATEDIBSECTION));
+}
+
+// The icon drawn on white into a 32-bit bitmap, so that icons from an image list and from
+// resources compare alike; empty for no icon.
+std::vector<BYTE> Pixels(HICON icon, int size) {
     if (!icon) return {};
-    HDC screen = GetDC(nullptr);
-    HDC dc = CreateCompatibleDC(screen);
     BITMAPINFO info = {};
     info.bmiHeader = {sizeof(BITMAPINFOHEADER), size, -size, 1, 32, BI_RGB};
     void* bits = nullptr;
+    HDC dc = CreateCompatibleDC(nullptr);
     HBITMAP bitmap = CreateDIBSection(dc, &info, DIB_RGB_COLORS, &bits, nullptr, 0);
     HGDIOBJ old = SelectObject(dc, bitmap);
+    PatBlt(dc, 0, 0, size, size, WHITENESS);
     DrawIconEx(dc, 0, 0, icon, size, size, 0, nullptr, DI_NORMAL);
+    GdiFlush();
     std::vector<BYTE> pixels(static_cast<const BYTE*>(bits), static_cast<const BYTE*>(bits) + size * size * 4);
     SelectObject(dc, old);
     DeleteObject(bitmap);
     DeleteDC(dc);
-    ReleaseDC(nullptr, screen);
-    DestroyIcon(icon);
     return pixels;
 }
 
-std::wstring ControlText(HWND dialog, int id) {
-    wchar_t text[128] = L"";
-    GetDlgItemTextW(dialog, id, text, 128);
-    return text;
+// The item icon resource whose picture is nearest to the icon.
+int NearestResource(HICON icon, int size) {
+    const std::vector<BYTE> pixels = Pixels(icon, size);
+    int nearest = 0;
+    long best = -1;
+    for (WORD id : {IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE}) {
+        HICON loaded = ModuleIcon(id, size);
+        const std::vector<BYTE> other = Pixels(loaded, size);
+        DestroyIcon(loaded);
+        long distance = 0;
+        for (size_t i = 0; i < pixels.size(); ++i) distance += std::abs(pixels[i] - other[i]);
+        if (best < 0 || distance < best) best = distance, nearest = id;
+    }
+    return nearest;
 }
 
 INT_PTR CALLBACK NoProc(HWND, UINT, WPARAM, LPARAM) { return FALSE; }
-
-HWND NewParentWindow() {
-    return CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
-}
 }  // namespace
 
 TEST(Resources, StringTable) {
@@ -57,7 +68,7 @@ TEST(Resources, StringTable) {
         {1065, L"Brennor GNSS Receivers"}, {1120, L"Refresh"}, {1121, L"Select"}, {1122, L"Open"},
         {55296, L""},  // absent on purpose: the time text falls back to its own default
     };
-    for (const auto& s : strings) EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id;
+    for (const auto& s : strings) { EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id; }
 }
 
 TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
@@ -65,7 +76,9 @@ TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
     for (int size : {16, 32, 48}) {
         std::vector<std::vector<BYTE>> pictures;
         for (WORD id : ids) {
-            pictures.push_back(IconPixels(id, size));
+            HICON icon = ModuleIcon(id, size);
+            pictures.push_back(Pixels(icon, size));
+            DestroyIcon(icon);
             ASSERT_EQ(static_cast<size_t>(size * size * 4), pictures.back().size()) << id << " at " << size;
         }
         for (size_t a = 0; a < pictures.size(); ++a)
@@ -75,68 +88,29 @@ TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
 }
 
 TEST(Resources, DialogTemplatesHoldTheirControls) {
-    struct { WORD dialog; int control; const wchar_t* text; } controls[] = {
-        {IDD_PROGRESS, IDCANCEL, L"Cancel"},
+    struct { WORD dialog; int control; const wchar_t* text; } controls[] = {  // control 0: the caption
+        {IDD_PROGRESS, 0, L"Progress..."},             {IDD_PROGRESS, IDCANCEL, L"Cancel"},
         {IDD_PROGRESS, IDC_PROGRESS_STATUS, L"Waiting for download..."},
-        {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},
-        {IDD_FIND, IDCANCEL, L"Stop"},
-        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},
-        {IDD_FIND, IDC_FIND_STATIC, L""},
+        {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},         {IDD_FIND, IDCANCEL, L"Stop"},
+        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},    {IDD_FIND, IDC_FIND_STATIC, L""},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_RECEIVER, L"Receiver:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_MODEL, L"Model:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_SERIAL, L"ID:"},
         {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_PORT, L"Port:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
+        {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""}, {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
     };
-    HWND parent = NewParentWindow();
+    HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
     for (const auto& c : controls) {
         HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, NoProc, 0);
         ASSERT_NE(nullptr, dialog) << c.dialog;
-        EXPECT_NE(nullptr, GetDlgItem(dialog, c.control)) << c.dialog << "/" << c.control;
-        EXPECT_EQ(c.text, ControlText(dialog, c.control)) << c.dialog << "/" << c.control;
+        HWND control = c.control ? GetDlgItem(dialog, c.control) : dialog;
+        wchar_t text[128] = L"";
+        GetWindowTextW(control, text, 128);
+        EXPECT_NE(nullptr, control) << c.dialog << "/" << c.control;
+        EXPECT_STREQ(c.text, text) << c.dialog << "/" << c.control;
         DestroyWindow(dialog);
     }
-    HWND progress = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(IDD_PROGRESS), parent, NoProc, 0);
-    wchar_t caption[64] = L"";
-    GetWindowTextW(progress, caption, 64);
-    EXPECT_STREQ(L"Progress...", caption);
-    wchar_t className[64] = L"";
-    GetClassNameW(GetDlgItem(progress, IDC_PROGRESS_BAR), className, 64);
-    EXPECT_STREQ(PROGRESS_CLASSW, className);
-    DestroyWindow(progress);
     DestroyWindow(parent);
-}
-
-TEST(Resources, SearchingClipPlaysInTheAnimationControl) {
-    HWND parent = NewParentWindow();
-    HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(IDD_FIND), parent, NoProc, 0);
-    ASSERT_NE(nullptr, dialog);
-    HWND animation = GetDlgItem(dialog, IDC_FIND_ANIMATION);
-    ASSERT_NE(nullptr, animation);
-    // Windows' control opens the clip named in the template and auto-plays it; Wine's does
-    // not open it by name, so open it as the template does and check that it plays.
-    ASSERT_TRUE(SendMessageW(animation, ACM_OPENW, reinterpret_cast<WPARAM>(ModuleInstance()),
-                             reinterpret_cast<LPARAM>(MAKEINTRESOURCEW(IDR_FIND_AVI))));
-    EXPECT_TRUE(SendMessageW(animation, ACM_PLAY, static_cast<WPARAM>(-1), MAKELPARAM(0, 0xFFFF)));
-    DestroyWindow(dialog);
-    DestroyWindow(parent);
-}
-
-TEST(Resources, TypeLibraryIsTheModules) {
-    wchar_t path[MAX_PATH];
-    GetModuleFileNameW(ModuleInstance(), path, MAX_PATH);
-    ITypeLib* library = nullptr;
-    ASSERT_EQ(S_OK, LoadTypeLibEx(path, REGKIND_NONE, &library));
-    TLIBATTR* attributes = nullptr;
-    ASSERT_EQ(S_OK, library->GetLibAttr(&attributes));
-    EXPECT_TRUE(IsEqualGUID(LIBID_CalvexReceiversShellExtLib, attributes->guid));
-    EXPECT_EQ(1, attributes->wMajorVerNum);
-    library->ReleaseTLibAttr(attributes);
-    ITypeInfo* folder = nullptr;
-    EXPECT_EQ(S_OK, library->GetTypeInfoOfGuid(CLSID_BrennorReceiversShellFolder, &folder));
-    if (folder) folder->Release();
-    library->Release();
 }
 
 TEST(Resources, ImageListsHoldSixImagesAtSystemSizes) {
@@ -153,4 +127,57 @@ TEST(Resources, ImageListsHoldSixImagesAtSystemSizes) {
         EXPECT_EQ(l.cx, cx);
         EXPECT_EQ(l.cy, cy);
     }
+}
+
+TEST(ExtractIcon, IndexIsTheLastItemKindLessOne) {
+    CReceiversPidlMgr mgr;
+    auto List = [&](std::initializer_list<std::pair<DWORD, const wchar_t*>> items) {
+        UniquePidl list;
+        for (const auto& item : items) {
+            UniquePidl one(mgr, mgr.Create(item.first, item.second));
+            list = UniquePidl(mgr, mgr.Concatenate(list.Get(), one.Get()));
+        }
+        return list;
+    };
+    const struct { UniquePidl list; int index; } cases[] = {
+        {List({{1, L"Calvex Receivers"}}), 0}, {List({{2, L"Calvex Receivers"}}), 1}, {List({{3, L"1!M!COM3"}}), 2},
+        {List({{4, L"1!M!COM3"}}), 3},         {List({{6, L"FILE.qpr"}}), 5},
+        {List({{2, L"Calvex Receivers"}, {4, L"1!M!COM3"}, {6, L"FILE.qpr"}}), 5},
+    };
+    for (const auto& c : cases) {
+        ComObject<CCalvexReceiversExtractIcon>* object = nullptr;
+        ASSERT_EQ(CreateComObject<CCalvexReceiversExtractIcon>(&object), S_OK);
+        ASSERT_EQ(object->SetItem(c.list.Get()), S_OK);
+        wchar_t location[16], before[16];
+        wmemset(location, L'#', 16), wmemset(before, L'#', 16);
+        int index = -7;
+        UINT flags = 0;
+        EXPECT_EQ(object->GetIconLocation(GIL_FORSHELL, location, 16, &index, &flags), S_OK);
+        EXPECT_EQ(index, c.index);
+        EXPECT_EQ(flags, static_cast<UINT>(GIL_NOTFILENAME));
+        EXPECT_EQ(wmemcmp(location, before, 16), 0) << "the location buffer was written";
+        object->Release();
+    }
+}
+
+TEST(ExtractIcon, ExtractGivesTheKindsPictureAtBothSizes) {
+    ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
+    const int large = GetSystemMetrics(SM_CXICON), small = GetSystemMetrics(SM_CXSMICON);
+    const int expected[] = {IDI_CALVEX, IDI_BRENNOR, IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE};
+    IExtractIconW* extract = nullptr;
+    ASSERT_EQ(CreateCalvexReceiversExtractIcon(nullptr, IID_IExtractIconW, reinterpret_cast<void**>(&extract)), S_OK);
+    for (UINT index = 0; index < 6; ++index) {
+        HICON bigIcon = nullptr, smallIcon = nullptr;
+        ASSERT_EQ(extract->Extract(L"ignored", index, &bigIcon, &smallIcon, MAKELONG(large, small)), S_OK);
+        ASSERT_TRUE(bigIcon && smallIcon) << index;
+        EXPECT_EQ(NearestResource(bigIcon, large), expected[index]) << "large " << index;
+        EXPECT_EQ(NearestResource(smallIcon, small), expected[index]) << "small " << index;
+        DestroyIcon(bigIcon);
+        DestroyIcon(smallIcon);
+    }
+    HICON bigIcon = reinterpret_cast<HICON>(1), smallIcon = reinterpret_cast<HICON>(1);
+    EXPECT_EQ(extract->Extract(nullptr, 9, &bigIcon, &smallIcon, 0), S_OK) << "no check of the index";
+    EXPECT_EQ(bigIcon, nullptr);
+    EXPECT_EQ(smallIcon, nullptr);
+    extract->Release();
 }

@@ -23,8 +23,7 @@ protected:
         RegDeleteTreeW(HKEY_CURRENT_USER, kSandbox);
     }
     void Store(const void* bytes, DWORD size) {
-        ASSERT_EQ(ERROR_SUCCESS, RegSetKeyValueW(HKEY_CURRENT_USER, kSettingsKey, kDisplaySettingsValue,
-                                                 REG_BINARY, bytes, size));
+        ASSERT_EQ(0, RegSetKeyValueW(HKEY_CURRENT_USER, kSettingsKey, kDisplaySettingsValue, REG_BINARY, bytes, size));
     }
 
     static constexpr const wchar_t* kSandbox = L"Software\\CalvexTests\\SettingsSandbox";
@@ -32,29 +31,19 @@ protected:
 };
 }  // namespace
 
-TEST_F(SettingsTest, MissingKeyGivesDefaults) {
-    DisplayState state;
-    state.NameColumnWidth = state.SecondColumnWidth = 7;
-    EXPECT_FALSE(ReadDisplaySettings(state));
-    EXPECT_EQ(100, state.NameColumnWidth);
-    EXPECT_EQ(100, state.SecondColumnWidth);
-}
-
 TEST_F(SettingsTest, StoredValueLengths) {
     const DWORD words[5] = {210, 95, 0, 0, 0};
-    struct Case {
-        DWORD size;
-        bool accepted;
-        LONG name, second;
-    } cases[] = {
+    struct { DWORD size; bool accepted; LONG name, second; } cases[] = {
+        {0, false, 100, 100},  // no value: defaults
         {8, true, 210, 95},    // two widths only
         {12, true, 210, 95},   // as the module writes it
         {16, true, 210, 95},   // the largest the reader takes
         {20, false, 100, 100}, // too long: refused, defaults
     };
-    for (const Case& c : cases) {
-        Store(words, c.size);
+    for (const auto& c : cases) {
+        if (c.size) Store(words, c.size);
         DisplayState state;
+        state.NameColumnWidth = state.SecondColumnWidth = 7;
         EXPECT_EQ(c.accepted, ReadDisplaySettings(state)) << c.size;
         EXPECT_EQ(c.name, state.NameColumnWidth) << c.size;
         EXPECT_EQ(c.second, state.SecondColumnWidth) << c.size;

@@ -34,18 +34,14 @@ TEST_F(TraceLogTest, EntryIsLocalTimePrefixThenMessage) {
 }
 
 TEST_F(TraceLogTest, MessagesAreWrittenAsGiven) {
-    struct Case {
-        const char* name;
-        void (*write)();
-        const char* message;
-    } cases[] = {
+    struct { const char* name; void (*write)(); const char* message; } cases[] = {  // no line end is ever added
         {"empty format writes the prefix alone", [] { TraceA(""); }, ""},
         {"narrow values", [] { TraceA("X::Y [0x%08X] %i %s\n", 0x8000FFFFu, -3, "z"); }, "X::Y [0x8000FFFF] -3 z\n"},
         {"wide %s is a wide string", [] { TraceW(L"A::B %s [%u]\r\n", L"Calvex Receivers\\Z/5@COM3", 7u); },
          "A::B Calvex Receivers\\Z/5@COM3 [7]\r\n"},
         {"empty wide format", [] { TraceW(L""); }, ""},
     };
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         CloseTraceLog();
         OpenTraceLog();  // recreated empty each time
         c.write();
@@ -54,15 +50,6 @@ TEST_F(TraceLogTest, MessagesAreWrittenAsGiven) {
         EXPECT_TRUE(std::regex_search(log, kPrefix)) << c.name;
         EXPECT_EQ(c.message, log.substr(14)) << c.name;
     }
-}
-
-TEST_F(TraceLogTest, MessageWithoutLineEndRunsIntoTheNextPrefix) {
-    TraceA("first");
-    TraceA("second\r\n");
-    const std::string log = testsupport::ReadTraceLog();
-    ASSERT_EQ(2 * 14 + 5 + 8u, log.size());
-    EXPECT_EQ("first", log.substr(14, 5));
-    EXPECT_TRUE(std::regex_search(log.substr(19), kPrefix)) << "same line, next prefix";
 }
 
 TEST_F(TraceLogTest, WideMessageIsCutToItsCountOfUnits) {
@@ -91,15 +78,9 @@ TEST_F(TraceLogTest, ConcurrentWritersNeverSplitAnEntry) {
     b.join();
     const std::string log = testsupport::ReadTraceLog();
     const std::regex entry(R"(\d\d:\d\d:\d\d\.\d{4}\tT[ab]::Line \d{4}\r\n)");
-    size_t position = 0;
-    int entries = 0;
-    std::smatch match;
-    std::string rest = log;
-    while (std::regex_search(rest, match, entry, std::regex_constants::match_continuous)) {
-        ++entries;
-        position += match.length(0);
-        rest = match.suffix();
-    }
-    EXPECT_EQ(2 * kLines, entries);
+    std::sregex_iterator it(log.begin(), log.end(), entry), end;
+    size_t position = 0, entries = 0;
+    for (; it != end && it->position() == static_cast<std::ptrdiff_t>(position); ++it) position += it->length(), ++entries;
+    EXPECT_EQ(2u * kLines, entries);
     EXPECT_EQ(log.size(), position) << "nothing but whole entries";
 }
