@@ -104,28 +104,23 @@ protected:
 };
 }  // namespace
 
-TEST_F(RegistrationTest, RegisterThenUnregisterTwice) {
+TEST_F(RegistrationTest, ExportsAndRegsvr32RegisterAndUnregister) {
     ASSERT_EQ(S_OK, CallExport("DllRegisterServer"));
     ExpectRegistered();
-    EXPECT_EQ(S_OK, CallExport("DllUnregisterServer"));
-    ExpectUnregistered();
-    EXPECT_EQ(S_OK, CallExport("DllUnregisterServer")) << "unregistering twice still succeeds";
-    ExpectUnregistered();
-}
-
-TEST_F(RegistrationTest, Regsvr32BothDirections) {
-    EXPECT_EQ(0u, RunRegsvr32(L"/s /u"));
-    ExpectUnregistered();
+    for (int round = 0; round < 2; ++round) {  // unregistering twice still succeeds
+        EXPECT_EQ(S_OK, CallExport("DllUnregisterServer"));
+        ExpectUnregistered();
+    }
     EXPECT_EQ(0u, RunRegsvr32(L"/s"));
     ExpectRegistered();
+    EXPECT_EQ(0u, RunRegsvr32(L"/s /u"));
+    ExpectUnregistered();
 }
 
 TEST_F(RegistrationTest, FailedModuleRegistrationWritesNoAttributes) {
     ASSERT_EQ(S_OK, CallExport("DllUnregisterServer"));
-    const HRESULT failure = HRESULT_FROM_WIN32(ERROR_ACCESS_DENIED);
-    static HRESULT s_failure;
-    s_failure = failure;
-    EXPECT_EQ(failure, RegisterServerWith([] { return s_failure; }));
+    EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_ACCESS_DENIED),
+              RegisterServerWith([] { return HRESULT_FROM_WIN32(ERROR_ACCESS_DENIED); }));
     for (const std::wstring& clsid : {kCalvex, kBrennor}) {
         DWORD attributes = 0;
         EXPECT_FALSE(Attributes(clsid, &attributes));

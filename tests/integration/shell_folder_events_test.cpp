@@ -48,16 +48,6 @@ IReceiversShellFolderImpl* Impl(IShellFolder* folder) {
     return static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder));
 }
 
-// Binds the folder to its collection the way Explorer does: by listing it.
-std::vector<LPITEMIDLIST> Enumerate(IShellFolder* folder, SHCONTF flags) {
-    std::vector<LPITEMIDLIST> items;
-    ComPtr<IEnumIDList> enumerator;
-    EXPECT_EQ(S_OK, folder->EnumObjects(nullptr, flags, &enumerator));
-    LPITEMIDLIST item = nullptr;
-    while (enumerator && enumerator->Next(1, &item, nullptr) == S_OK) items.push_back(item);
-    return items;
-}
-
 // Waits for a line written after the trace had `from` bytes.
 bool WaitForTrace(const std::string& line, size_t from, DWORD timeout = 15000) {
     return PumpUntil([&] { return ReadTraceLog().find(line, from) != std::string::npos; }, timeout);
@@ -72,12 +62,7 @@ protected:
         g_notified.clear();
         g_viewMessages.clear();
         CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
-        ReceiverSetup setup;
-        setup.folder = L"Calvex A";
-        setup.serialNumber = L"1000-0001";
-        setup.model = L"Q9 GNSS";
-        setup.portType = 2;
-        tree.AddReceiver(setup);
+        tree.AddReceiver({L"Calvex A"});  // 1000-0001, Q9 GNSS, on USB
         tree.AddFile(L"Calvex A", L"LOG0001", 100);
         scope.reset(new DeviceSimScope(tree.Root()));
     }
@@ -98,14 +83,12 @@ TEST_F(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
     root.QueryTo(IID_IPersistFolder, persist.PutVoid());
     ASSERT_EQ(S_OK, persist->Initialize(nullptr));
     persist.Reset();
-    std::vector<LPITEMIDLIST> receivers = Enumerate(root.Get(), SHCONTF_FOLDERS);
+    // Listed as Explorer lists them, which binds each folder to its collection.
+    std::vector<TaskPidl> receivers = ListItems(root.Get(), SHCONTF_FOLDERS);
     ASSERT_EQ(1u, receivers.size());
     ComPtr<IShellFolder> receiver;
-    ASSERT_EQ(S_OK, root->BindToObject(receivers[0], nullptr, IID_IShellFolder, receiver.PutVoid()));
-    std::vector<LPITEMIDLIST> files = Enumerate(receiver.Get(), SHCONTF_NONFOLDERS);
-    EXPECT_EQ(1u, files.size());
-    for (LPITEMIDLIST item : receivers) CoTaskMemFree(item);
-    for (LPITEMIDLIST item : files) CoTaskMemFree(item);
+    ASSERT_EQ(S_OK, root->BindToObject(receivers[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid()));
+    EXPECT_EQ(1u, ListItems(receiver.Get(), SHCONTF_NONFOLDERS).size());
 
     HWND rootView = NewViewWindow(), receiverView = NewViewWindow();
     Impl(root.Get())->AddViewWindow(rootView);
@@ -123,13 +106,7 @@ TEST_F(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
          "CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n", receiverPath, receiverView},
         {"file deleted", [](ReceiverTree& t) { t.RemoveFile(L"Calvex A", L"LOG0001"); },
          "CCalvexFilesShellFolderEventHandler::OnFileDeleted\r\n", receiverPath, receiverView},
-        {"receiver plugged in",
-         [](ReceiverTree& t) {
-             ReceiverSetup setup;
-             setup.folder = L"Calvex B";
-             setup.serialNumber = L"1000-0002";
-             t.AddReceiver(setup);
-         },
+        {"receiver plugged in", [](ReceiverTree& t) { t.AddReceiver({L"Calvex B", 1, L"B", L"1000-0002"}); },
          "CCalvexReceiversShellFolderEventHandler::OnReceiverOnline\r\n", kRootPath, rootView},
     };
     for (Step& step : steps) {

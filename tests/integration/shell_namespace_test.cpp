@@ -1,4 +1,4 @@
-// Guards the walk through Wine's shell: brand folders that do not parse, bind, enumerate, walk into receivers or reach the browser.
+// Guards the walk through Wine's shell: brand folders missing under My Computer, or that do not parse, bind, enumerate, walk into receivers or reach the browser.
 #include <windows.h>
 #include <shlobj.h>
 #include <shlwapi.h>
@@ -16,6 +16,8 @@
 #include "module/ClassIds.h"
 #include "support/TestSupport.h"
 
+using namespace testsupport;
+
 namespace {
 const wchar_t kComputer[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}";
 const wchar_t kCalvex[] = L"::{E102076F-4057-4e7f-8209-511258F12B62}";
@@ -27,13 +29,13 @@ struct Listed {
     SFGAOF attributes;
 };
 
-LPITEMIDLIST ParseFromDesktop(const std::wstring& path) {
+TaskPidl ParseFromDesktop(const std::wstring& path) {
     ComPtr<IShellFolder> desktop;
     EXPECT_EQ(S_OK, SHGetDesktopFolder(&desktop));
     std::wstring text = path;
     LPITEMIDLIST pidl = nullptr;
-    EXPECT_EQ(S_OK, desktop->ParseDisplayName(nullptr, nullptr, &text[0], nullptr, &pidl, nullptr)) << testsupport::Narrow(path);
-    return pidl;
+    EXPECT_EQ(S_OK, desktop->ParseDisplayName(nullptr, nullptr, &text[0], nullptr, &pidl, nullptr)) << Narrow(path);
+    return TaskPidl(pidl);
 }
 
 ComPtr<IShellFolder> BindFromDesktop(LPCITEMIDLIST pidl) {
@@ -54,83 +56,100 @@ std::wstring NameOf(IShellFolder* folder, LPCITEMIDLIST child, SHGDNF flags) {
 }
 
 // Every item of the folder, with the children's lists when asked for.
-std::vector<Listed> List(IShellFolder* folder, SHCONTF flags, std::vector<LPITEMIDLIST>* children = nullptr) {
+std::vector<Listed> List(IShellFolder* folder, SHCONTF flags, std::vector<TaskPidl>* children = nullptr) {
     std::vector<Listed> listed;
-    ComPtr<IEnumIDList> items;
-    EXPECT_EQ(S_OK, folder->EnumObjects(nullptr, flags, &items));
-    if (!items) return listed;
-    LPITEMIDLIST child = nullptr;
-    while (items->Next(1, &child, nullptr) == S_OK) {
+    HRESULT hr = E_FAIL;
+    for (TaskPidl& child : ListItems(folder, flags, &hr)) {
         SFGAOF attributes = 0xFFFFFFFF;
-        LPCITEMIDLIST one[] = {child};
+        LPCITEMIDLIST one[] = {child.get()};
         folder->GetAttributesOf(1, one, &attributes);
-        listed.push_back({NameOf(folder, child, SHGDN_FORPARSING | SHGDN_INFOLDER), NameOf(folder, child, SHGDN_NORMAL),
-                          attributes});
-        if (children) children->push_back(child); else CoTaskMemFree(child);
+        listed.push_back({NameOf(folder, child.get(), SHGDN_FORPARSING | SHGDN_INFOLDER),
+                          NameOf(folder, child.get(), SHGDN_NORMAL), attributes});
+        if (children) children->push_back(std::move(child));
     }
+    EXPECT_EQ(S_OK, hr);
     return listed;
 }
 
-class ShellNamespaceTest : public testing::TestWithParam<const wchar_t*> {};
+struct Brand {
+    const wchar_t* path;
+    unsigned kind;
+};
+class ShellNamespaceTest : public testing::TestWithParam<Brand> {};
 }  // namespace
 
 TEST_P(ShellNamespaceTest, ParseBindEnumerateAndWalkIntoAReceiver) {
-    const std::wstring root = std::wstring(kComputer) + L"\\" + GetParam();
-    LPITEMIDLIST rootPidl = ParseFromDesktop(root);
-    ASSERT_NE(nullptr, rootPidl);
-    ComPtr<IShellFolder> folder = BindFromDesktop(rootPidl);
+    const std::wstring root = std::wstring(kComputer) + L"\\" + GetParam().path;
+    TaskPidl rootPidl = ParseFromDesktop(root);
+    ASSERT_TRUE(rootPidl);
+    ComPtr<IShellFolder> folder = BindFromDesktop(rootPidl.get());
     ASSERT_TRUE(folder);
 
-    std::vector<LPITEMIDLIST> children;
+    std::vector<TaskPidl> children;
     std::vector<Listed> receivers = List(folder.Get(), SHCONTF_FOLDERS | SHCONTF_NONFOLDERS, &children);
     ASSERT_FALSE(receivers.empty()) << "the sample tree has receivers of both brands";
     for (const Listed& receiver : receivers) {
-        SCOPED_TRACE(testsupport::Narrow(receiver.inFolder));
+        SCOPED_TRACE(Narrow(receiver.inFolder));
         EXPECT_EQ(2, std::count(receiver.inFolder.begin(), receiver.inFolder.end(), L'!')) << "serial!model!port";
         EXPECT_NE(std::wstring::npos, receiver.normal.find(L'@')) << "model@port";
         EXPECT_EQ(0x22000000u, receiver.attributes);
     }
 
-    // Into the first receiver: the files, and the same receiver reached by parsing its path.
-    ComPtr<IShellFolder> receiverFolder;
-    ASSERT_EQ(S_OK, folder->BindToObject(children[0], nullptr, IID_IShellFolder, receiverFolder.PutVoid()));
+    // Into the first receiver: a folder made by the parent's class, its files, and the same
+    // receiver reached by parsing its path.
+    ComPtr<IShellFolder2> receiverFolder;
+    ASSERT_EQ(S_OK, folder->BindToObject(children[0].get(), nullptr, IID_IShellFolder2, receiverFolder.PutVoid()));
     std::vector<Listed> files = List(receiverFolder.Get(), SHCONTF_NONFOLDERS);
-    for (const Listed& file : files) EXPECT_EQ(0x02000001u, file.attributes) << testsupport::Narrow(file.inFolder);
+    auto* impl = static_cast<IReceiversShellFolderImpl*>(receiverFolder.Get());
+    EXPECT_EQ(GetParam().kind == BrandBrennor, dynamic_cast<CBrennorReceiversShellFolder*>(impl) != nullptr);
+    EXPECT_EQ(GetParam().kind, impl->BrandKind());
+    EXPECT_TRUE(impl->EventSourceCollection()) << "bound to the receiver's files";
+    for (const Listed& file : files) EXPECT_EQ(0x02000001u, file.attributes) << Narrow(file.inFolder);
     EXPECT_TRUE(List(receiverFolder.Get(), SHCONTF_FOLDERS).empty()) << "receivers hold no folders";
 
-    LPITEMIDLIST receiverPidl = ParseFromDesktop(root + L"\\" + receivers[0].inFolder);
-    ASSERT_NE(nullptr, receiverPidl);
-    ComPtr<IShellFolder> parsedFolder = BindFromDesktop(receiverPidl);
+    TaskPidl receiverPidl = ParseFromDesktop(root + L"\\" + receivers[0].inFolder);
+    ASSERT_TRUE(receiverPidl);
+    ComPtr<IShellFolder> parsedFolder = BindFromDesktop(receiverPidl.get());
     ASSERT_TRUE(parsedFolder);
     EXPECT_EQ(files.size(), List(parsedFolder.Get(), SHCONTF_NONFOLDERS).size());
 
-    for (LPITEMIDLIST child : children) CoTaskMemFree(child);
-    CoTaskMemFree(receiverPidl);
-    CoTaskMemFree(rootPidl);
-
-    const std::string rootText = testsupport::Narrow(root);
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\r\n"));
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::EnumObjects Calvex Receivers\r\n"));
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\\" +
-                                           testsupport::Narrow(receivers[0].inFolder) + "\r\n"));
-    EXPECT_TRUE(testsupport::TraceContains("Advised for receivers, 0x"));
-    EXPECT_TRUE(testsupport::TraceContains("Advised for files, 0x"));
+    const std::string rootText = Narrow(root);
+    EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\r\n"));
+    EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::EnumObjects Calvex Receivers\r\n"));
+    EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::Init " + rootText + "\\" +
+                                           Narrow(receivers[0].inFolder) + "\r\n"));
+    EXPECT_TRUE(TraceContains("Advised for receivers, 0x"));
+    EXPECT_TRUE(TraceContains("Advised for files, 0x"));
 }
 
-INSTANTIATE_TEST_SUITE_P(Brands, ShellNamespaceTest, testing::Values(kCalvex, kBrennor));
+INSTANTIATE_TEST_SUITE_P(Brands, ShellNamespaceTest, testing::Values(Brand{kCalvex, BrandCalvex}, Brand{kBrennor, BrandBrennor}));
+
+// Wine's shell lists what the registration put under My Computer, as folders.
+TEST(ShellNamespace, MyComputerListsBothBrandFolders) {
+    LPITEMIDLIST drives = nullptr;
+    ASSERT_EQ(S_OK, SHGetSpecialFolderLocation(nullptr, CSIDL_DRIVES, &drives));
+    TaskPidl owned(drives);
+    ComPtr<IShellFolder> folder = BindFromDesktop(drives);
+    ASSERT_TRUE(folder);
+    const std::vector<Listed> items = List(folder.Get(), SHCONTF_FOLDERS | SHCONTF_NONFOLDERS);
+    for (const wchar_t* brand : {L"Calvex GNSS Receivers", L"Brennor GNSS Receivers"}) {
+        auto found = std::find_if(items.begin(), items.end(), [&](const Listed& item) { return item.normal == brand; });
+        ASSERT_NE(items.end(), found) << Narrow(brand);
+        EXPECT_TRUE(found->attributes & SFGAO_FOLDER) << Narrow(brand);
+    }
+}
 
 // Wine's ExplorerBrowser walks into the receiver (our folder is made for it), asks it for
 // its view and shows it: the view lists the receiver's files.
 TEST(ShellNamespace, ExplorerBrowserWalksIntoAReceiverAndAsksForItsView) {
     const std::wstring root = std::wstring(kComputer) + L"\\" + kCalvex;
-    LPITEMIDLIST rootPidl = ParseFromDesktop(root);
-    ASSERT_NE(nullptr, rootPidl);
-    std::vector<Listed> receivers = List(BindFromDesktop(rootPidl).Get(), SHCONTF_FOLDERS);
-    CoTaskMemFree(rootPidl);
+    TaskPidl rootPidl = ParseFromDesktop(root);
+    ASSERT_TRUE(rootPidl);
+    std::vector<Listed> receivers = List(BindFromDesktop(rootPidl.get()).Get(), SHCONTF_FOLDERS);
     ASSERT_FALSE(receivers.empty());
     const std::wstring receiverPath = root + L"\\" + receivers[0].inFolder;
-    LPITEMIDLIST receiverPidl = ParseFromDesktop(receiverPath);
-    ASSERT_NE(nullptr, receiverPidl);
+    TaskPidl receiverPidl = ParseFromDesktop(receiverPath);
+    ASSERT_TRUE(receiverPidl);
 
     HWND host = CreateWindowExW(0, L"STATIC", L"host", WS_OVERLAPPEDWINDOW, 0, 0, 640, 480, nullptr, nullptr, nullptr, nullptr);
     ASSERT_NE(nullptr, host);
@@ -140,40 +159,16 @@ TEST(ShellNamespace, ExplorerBrowserWalksIntoAReceiverAndAsksForItsView) {
     RECT bounds = {0, 0, 640, 480};
     FOLDERSETTINGS settings = {FVM_DETAILS, 0};
     ASSERT_EQ(S_OK, browser->Initialize(host, &bounds, &settings));
-    const size_t from = testsupport::ReadTraceLog().size();
-    const HRESULT hr = browser->BrowseToIDList(receiverPidl, SBSP_ABSOLUTE);
-    testsupport::PumpMessagesFor(500);
+    const size_t from = ReadTraceLog().size();
+    const HRESULT hr = browser->BrowseToIDList(receiverPidl.get(), SBSP_ABSOLUTE);
+    PumpMessagesFor(500);
     EXPECT_EQ(S_OK, hr);
-    const std::string trace = testsupport::ReadTraceLog().substr(from);
-    EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::Init " + testsupport::Narrow(receiverPath) + "\r\n"))
+    const std::string trace = ReadTraceLog().substr(from);
+    EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::Init " + Narrow(receiverPath) + "\r\n"))
         << "the browser bound the receiver folder";
     EXPECT_NE(std::string::npos, trace.find("IReceiversShellFolderImpl::CreateViewObject from 0x"));
     EXPECT_NE(std::string::npos, trace.find("CCalvexReceiversShellView::OnEnumIdList - OK\r\n"));
-    CoTaskMemFree(receiverPidl);
     browser->Destroy();
     browser.Reset();
     DestroyWindow(host);
-}
-
-// A receiver sub-folder is made by its parent's class: a Brennor root hands out Brennor
-// receiver folders, which still report the Calvex class.
-TEST(ShellNamespace, ReceiverFoldersKeepTheirParentsBrand) {
-    ComObject<CBrennorReceiversShellFolder>* root = nullptr;
-    ASSERT_EQ(S_OK, CreateComObject<CBrennorReceiversShellFolder>(&root));
-    ComPtr<IShellFolder> rootFolder(static_cast<IShellFolder2*>(root));
-    root->Release();
-    ASSERT_EQ(S_OK, root->Initialize(nullptr));
-    std::vector<LPITEMIDLIST> children;
-    List(rootFolder.Get(), SHCONTF_FOLDERS, &children);
-    ASSERT_FALSE(children.empty());
-    ComPtr<IShellFolder2> receiver;
-    ASSERT_EQ(S_OK, rootFolder->BindToObject(children[0], nullptr, IID_IShellFolder2, receiver.PutVoid()));
-    auto* impl = static_cast<IReceiversShellFolderImpl*>(receiver.Get());
-    EXPECT_NE(nullptr, dynamic_cast<CBrennorReceiversShellFolder*>(impl));
-    EXPECT_EQ(2u, impl->BrandKind());
-    EXPECT_TRUE(impl->EventSourceCollection()) << "bound to the receiver's files";
-    CLSID clsid = GUID_NULL;
-    EXPECT_EQ(S_OK, impl->GetClassID(&clsid));
-    EXPECT_TRUE(IsEqualCLSID(CLSID_CalvexReceiversShellFolder, clsid));
-    for (LPITEMIDLIST child : children) CoTaskMemFree(child);
 }

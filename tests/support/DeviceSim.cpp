@@ -61,28 +61,7 @@ bool ReceiverTree::RemoveFile(const std::wstring& folder, const std::wstring& na
     return DeleteFileW((FolderPath(folder) + L"\\" + name).c_str()) != FALSE;
 }
 
-bool ReceiverTree::RemoveReceiver(const std::wstring& folder) {
-    const std::wstring path = FolderPath(folder);
-    WIN32_FIND_DATAW data;
-    HANDLE find = FindFirstFileW((path + L"\\*").c_str(), &data);
-    if (find != INVALID_HANDLE_VALUE) {
-        do {
-            if (!(data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)) DeleteFileW((path + L"\\" + data.cFileName).c_str());
-        } while (FindNextFileW(find, &data));
-        FindClose(find);
-    }
-    return RemoveDirectoryW(path.c_str()) != FALSE;
-}
-
-std::string ReadFileBytes(const std::wstring& path) {
-    UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
-                                nullptr, OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr));
-    std::string bytes;
-    char buffer[65536];
-    DWORD read = 0;
-    while (file && ReadFile(file.Get(), buffer, sizeof buffer, &read, nullptr) && read > 0) bytes.append(buffer, read);
-    return bytes;
-}
+bool ReceiverTree::RemoveReceiver(const std::wstring& folder) { return DeleteTree(FolderPath(folder)); }
 
 bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
@@ -219,49 +198,24 @@ SimEventRecorder::~SimEventRecorder() {
     Clear();
 }
 
-ComPtr<SimEventRecorder> SimEventRecorder::Create(REFIID events) {
-    ComObject<SimEventRecorder>* object = nullptr;
-    CreateComObject<SimEventRecorder>(&object, events);
-    ComPtr<SimEventRecorder> recorder;
-    recorder.Attach(object);
-    return recorder;
-}
-
-STDMETHODIMP SimEventRecorder::GetTypeInfoCount(UINT* count) {
-    *count = 0;
-    return S_OK;
-}
-STDMETHODIMP SimEventRecorder::GetTypeInfo(UINT, LCID, ITypeInfo** info) {
-    *info = nullptr;
-    return E_NOTIMPL;
-}
-STDMETHODIMP SimEventRecorder::GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) { return E_NOTIMPL; }
-
-STDMETHODIMP SimEventRecorder::Invoke(DISPID id, REFIID, LCID, WORD, DISPPARAMS* params, VARIANT*, EXCEPINFO*,
-                                      UINT*) {
+void SimEventRecorder::DispatchEvent(DISPID id, const VARIANT* args, UINT count) {
     Event event{id, nullptr, {}};
     VariantInit(&event.second);
-    if (params && params->cArgs >= 1) {
-        const VARIANT& first = params->rgvarg[params->cArgs - 1];
-        if (first.vt == VT_DISPATCH) event.subject = ComPtr<IDispatch>(first.pdispVal);
-        if (params->cArgs >= 2) VariantCopy(&event.second, &params->rgvarg[params->cArgs - 2]);
-    }
+    if (count >= 1 && args[0].vt == VT_DISPATCH) event.subject = ComPtr<IDispatch>(args[0].pdispVal);
+    if (count >= 2) VariantCopy(&event.second, const_cast<VARIANT*>(&args[1]));
     m_received.push_back(event);
-    return S_OK;
 }
 
 HRESULT SimEventRecorder::Advise(IUnknown* source) {
-    ComPtr<IConnectionPointContainer> container;
-    HRESULT hr = source->QueryInterface(IID_IConnectionPointContainer, container.PutVoid());
-    if (SUCCEEDED(hr)) hr = container->FindConnectionPoint(m_events, &m_point);
-    if (SUCCEEDED(hr)) hr = m_point->Advise(static_cast<IDispatch*>(this), &m_cookie);
+    const HRESULT hr = DispEventSink::Advise(source);
+    if (SUCCEEDED(hr)) m_source = ComPtr<IUnknown>(source);
     return hr;
 }
 
 HRESULT SimEventRecorder::Unadvise() {
-    if (!m_point) return S_FALSE;
-    HRESULT hr = m_point->Unadvise(m_cookie);
-    m_point.Reset();
+    if (!m_source) return S_FALSE;
+    const HRESULT hr = DispEventSink::Unadvise(m_source.Get());
+    m_source.Reset();
     return hr;
 }
 

@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "CalvexDeviceMgrLib.h"
-#include "com/ComObject.h"
+#include "com/DispEventSink.h"
 #include "com/ComPtr.h"
 #include "support/TestSupport.h"
 
@@ -54,7 +54,6 @@ private:
     TempDirectory m_dir;
 };
 
-std::string ReadFileBytes(const std::wstring& path);
 bool FileExists(const std::wstring& path);
 
 // Makes every running CalvexDeviceSim.exe of the prefix quit ("CalvexDeviceSim.exe /Quit")
@@ -105,7 +104,7 @@ bool IsServerGone(HRESULT hr);
 
 // A sink for any of the device manager's three event interfaces that records every call.
 // Subjects are kept, not read, inside the call: a handler never calls back into the server.
-class SimEventRecorder : public ComObjectRoot, public IDispatch {
+class SimEventRecorder : public DispEventSink {
 public:
     struct Event {
         DISPID id;
@@ -113,22 +112,9 @@ public:
         VARIANT second;  // VT_EMPTY when the event has one parameter
     };
 
-    explicit SimEventRecorder(REFIID events) : m_events(events) {}
-    ~SimEventRecorder() override;
+    explicit SimEventRecorder(REFIID events) : DispEventSink(events, LIBID_CalvexDeviceMgrLib, 1, 0) {}
     // A new recorder with one reference, owned by the caller.
-    static ComPtr<SimEventRecorder> Create(REFIID events);
-
-    BEGIN_INTERFACE_TABLE(SimEventRecorder)
-        INTERFACE_ENTRY(IDispatch)
-        INTERFACE_ENTRY_IID(DIID__IReceiversCollEvents, IDispatch)
-        INTERFACE_ENTRY_IID(DIID__IFilesCollEvents, IDispatch)
-        INTERFACE_ENTRY_IID(DIID__IReceiverFileEvents, IDispatch)
-    END_INTERFACE_TABLE()
-
-    STDMETHODIMP GetTypeInfoCount(UINT* count) override;
-    STDMETHODIMP GetTypeInfo(UINT, LCID, ITypeInfo** info) override;
-    STDMETHODIMP GetIDsOfNames(REFIID, LPOLESTR*, UINT, LCID, DISPID*) override;
-    STDMETHODIMP Invoke(DISPID id, REFIID, LCID, WORD, DISPPARAMS* params, VARIANT*, EXCEPINFO*, UINT*) override;
+    static ComPtr<SimEventRecorder> Create(REFIID events) { return ComPtr<SimEventRecorder>(new SimEventRecorder(events)); }
 
     HRESULT Advise(IUnknown* source);
     HRESULT Unadvise();
@@ -138,10 +124,12 @@ public:
     bool WaitFor(DISPID id, DWORD timeoutMilliseconds, size_t count = 1) const;
     void Clear();
 
+protected:
+    ~SimEventRecorder() override;
+    void DispatchEvent(DISPID id, const VARIANT* args, UINT count) override;
+
 private:
-    IID m_events;
-    ComPtr<IConnectionPoint> m_point;
-    DWORD m_cookie = 0;
+    ComPtr<IUnknown> m_source;
     std::vector<Event> m_received;
 };
 

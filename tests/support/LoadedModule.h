@@ -2,6 +2,7 @@
 // The built DLL loaded as Explorer loads it, with the exports the tests call.
 #include <windows.h>
 
+#include "com/Handles.h"
 #include "support/TestSupport.h"
 
 namespace testsupport {
@@ -12,27 +13,18 @@ public:
     using CanUnloadNowFn = HRESULT(STDAPICALLTYPE*)();
 
     LoadedModule() : m_module(LoadLibraryW(ModuleDllPath().c_str())) {
-        if (m_module) {
-            getClassObject = reinterpret_cast<GetClassObjectFn>(GetProcAddress(m_module, "DllGetClassObject"));
-            canUnloadNow = reinterpret_cast<CanUnloadNowFn>(GetProcAddress(m_module, "DllCanUnloadNow"));
-        }
+        getClassObject = reinterpret_cast<GetClassObjectFn>(GetProcAddress(m_module.Get(), "DllGetClassObject"));
+        canUnloadNow = reinterpret_cast<CanUnloadNowFn>(GetProcAddress(m_module.Get(), "DllCanUnloadNow"));
     }
-    ~LoadedModule() { Unload(); }
-    LoadedModule(const LoadedModule&) = delete;
-    LoadedModule& operator=(const LoadedModule&) = delete;
-
-    void Unload() {
-        if (m_module) FreeLibrary(m_module);
-        m_module = nullptr;
-    }
+    void Unload() { m_module.Reset(); }
     bool Loaded() const { return m_module && getClassObject && canUnloadNow; }
-    HMODULE Handle() const { return m_module; }
+    HMODULE Handle() const { return m_module.Get(); }
 
     GetClassObjectFn getClassObject = nullptr;
     CanUnloadNowFn canUnloadNow = nullptr;
 
 private:
-    HMODULE m_module;
+    UniqueLibrary m_module;
 };
 
 }  // namespace testsupport

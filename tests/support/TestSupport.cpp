@@ -2,21 +2,19 @@
 
 #include <shellapi.h>
 
+#include "com/Handles.h"
+
 #include <algorithm>
 #include <cstdlib>
 
 namespace testsupport {
 
-std::wstring UnixToWindowsPath(const std::string& unixPath) {
-    std::wstring path = L"Z:" + Wide(unixPath);
-    for (auto& c : path)
-        if (c == L'/') c = L'\\';
-    return path;
-}
-
+// "/work/x" -> "Z:\work\x": Wine maps the Unix root to drive Z:.
 static std::wstring DirFromEnvironment(const char* name) {
     const char* value = std::getenv(name);
-    return value ? UnixToWindowsPath(value) : std::wstring();
+    std::wstring path = value ? L"Z:" + Wide(value) : std::wstring();
+    std::replace(path.begin(), path.end(), L'/', L'\\');
+    return path;
 }
 
 std::wstring BuildDir() { return DirFromEnvironment("CALVEX_BUILD_DIR"); }
@@ -63,17 +61,17 @@ std::wstring TraceLogPath() {
     return std::wstring(dir) + L"CalvexReceiversShellExt.log";
 }
 
-std::string ReadTraceLog() {
-    HANDLE file = CreateFileW(TraceLogPath().c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE,
-                              nullptr, OPEN_EXISTING, 0, nullptr);
-    if (file == INVALID_HANDLE_VALUE) return std::string();
+std::string ReadFileBytes(const std::wstring& path) {
+    UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
+                                nullptr, OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr));
     std::string bytes;
     char buffer[65536];
     DWORD read = 0;
-    while (ReadFile(file, buffer, sizeof buffer, &read, nullptr) && read > 0) bytes.append(buffer, read);
-    CloseHandle(file);
+    while (file && ReadFile(file.Get(), buffer, sizeof buffer, &read, nullptr) && read > 0) bytes.append(buffer, read);
     return bytes;
 }
+
+std::string ReadTraceLog() { return ReadFileBytes(TraceLogPath()); }
 
 std::vector<std::string> TraceMessages() {
     std::vector<std::string> messages;
@@ -92,6 +90,17 @@ std::vector<std::string> TraceMessages() {
 
 bool TraceContains(const std::string& message) {
     return ReadTraceLog().find(message) != std::string::npos;
+}
+
+std::vector<TaskPidl> ListItems(IShellFolder* folder, SHCONTF flags, HRESULT* result) {
+    std::vector<TaskPidl> items;
+    IEnumIDList* enumerator = nullptr;
+    const HRESULT hr = folder->EnumObjects(nullptr, flags, &enumerator);
+    if (result) *result = hr;
+    LPITEMIDLIST item = nullptr;
+    while (enumerator && enumerator->Next(1, &item, nullptr) == S_OK) items.emplace_back(item);
+    if (enumerator) enumerator->Release();
+    return items;
 }
 
 std::string Narrow(const std::wstring& text) {
@@ -116,13 +125,15 @@ TempDirectory::TempDirectory(const std::wstring& name) {
     CreateDirectoryW(m_path.c_str(), nullptr);
 }
 
-TempDirectory::~TempDirectory() {
-    std::wstring from = m_path + L'\0';  // SHFileOperation wants a double-terminated list
+TempDirectory::~TempDirectory() { DeleteTree(m_path); }
+
+bool DeleteTree(const std::wstring& path) {
+    std::wstring from = path + L'\0';  // SHFileOperation wants a double-terminated list
     SHFILEOPSTRUCTW op = {};
     op.wFunc = FO_DELETE;
     op.pFrom = from.c_str();
     op.fFlags = FOF_NO_UI;
-    SHFileOperationW(&op);
+    return SHFileOperationW(&op) == 0;
 }
 
 }  // namespace testsupport

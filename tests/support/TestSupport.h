@@ -1,15 +1,15 @@
 #pragma once
 // Helpers shared by the tests: paths of the build, message pumping, the trace file.
 #include <windows.h>
+#include <shobjidl.h>
 
 #include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
 namespace testsupport {
 
-// "/work/x" -> "Z:\work\x" (Wine maps the Unix root to drive Z:).
-std::wstring UnixToWindowsPath(const std::string& unixPath);
 // The build and source trees, from CALVEX_BUILD_DIR / CALVEX_SOURCE_DIR set by ctest.
 std::wstring BuildDir();
 std::wstring SourceDir();
@@ -24,6 +24,9 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
 // that is quitting may call back into it). The exit code, or the error that stopped it.
 DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000);
 
+// A file's bytes, also while another holds it open for writing; empty when it cannot be read.
+std::string ReadFileBytes(const std::wstring& path);
+
 std::wstring TraceLogPath();
 // The whole trace file as bytes (readable while the module holds it open).
 std::string ReadTraceLog();
@@ -31,8 +34,19 @@ std::string ReadTraceLog();
 std::vector<std::string> TraceMessages();
 bool TraceContains(const std::string& message);
 
+// Item identifier lists owned as the shell hands them out.
+struct TaskMemFree {
+    void operator()(void* block) const { CoTaskMemFree(block); }
+};
+using TaskPidl = std::unique_ptr<ITEMIDLIST, TaskMemFree>;
+// The folder's items; EnumObjects' result where asked for.
+std::vector<TaskPidl> ListItems(IShellFolder* folder, SHCONTF flags, HRESULT* result = nullptr);
+
 std::string Narrow(const std::wstring& text);
 std::wstring Wide(const std::string& text);
+
+// Removes a directory with its contents.
+bool DeleteTree(const std::wstring& path);
 
 // A fresh empty directory under %TEMP%, removed with its contents on destruction.
 class TempDirectory {
