@@ -3,6 +3,8 @@
 # Opens My Computer, then each brand folder and one of its receivers, by keyboard as a user
 # does (type-ahead and Enter); at each level reads what our view's list control shows
 # (view_probe) and compares it with the namespace as calvex-shell lists it through the shell.
+# In the first brand it widens two columns with the mouse and checks that the receiver's view
+# takes the widths over, and it copies a receiver's files out through the view's menu.
 # Screenshots of each level go to SHOTS_DIR (default BUILD_DIR/shots).
 set -u
 build=$1
@@ -35,6 +37,12 @@ open_item() {
 
 # The window Wine's Explorer opens has no frame here: it sits at the top left of the screen.
 click_list() { xdotool mousemove "$1" "$2" click 1; sleep 0.5; }
+# Drags a header divider of our list from x to x2, as a user widening a column.
+drag_divider() {
+  xdotool mousemove "$1" 92 sleep 0.3 mousedown 1 sleep 0.3 mousemove $((($1 + $2) / 2)) 92 sleep 0.2 \
+    mousemove "$2" 92 sleep 0.3 mouseup 1
+  sleep 0.5
+}
 
 "$run" explorer >/dev/null 2>&1 &
 explorer=$!
@@ -52,6 +60,14 @@ walk_brand() {
     bad "$brand: no receivers view"; return
   fi
   ok
+  if [ -n "$widen" ]; then
+    # Name from 100 to 150, then "Serial number" from 100 to 130: the widths every column but
+    # "Time" and the "Time" column get from now on, in every view of the process.
+    drag_divider 257 307
+    drag_divider 407 437
+    view=$(probe)
+    grep -qxF "widths: 150|130|100|100" <<<"$view" && ok || bad "$brand: dragged widths: $(grep '^widths' <<<"$view")"
+  fi
   import -window root "$shots/$shot-receivers.png"
   # Every receiver the shell lists under this root is a row: display name, serial, model, port.
   local section
@@ -76,6 +92,9 @@ walk_brand() {
   ok
   sleep 1
   view=$(probe)
+  if [ -n "$widen" ]; then
+    grep -qxF "widths: 150|150|130" <<<"$view" && ok || bad "$brand: files level widths: $(grep '^widths' <<<"$view")"
+  fi
   import -window root "$shots/$shot-files.png"
   local files
   files=$(sed -n "/$root/,/^::/p" <<<"$tree" | sed -n "/\[+\] $receiver/,/\[+\]/p" | grep '^     -  ' |
@@ -123,9 +142,9 @@ copy_all() {
 click_list 400 300
 open_item "My"
 sleep 2
-copy_from="$(dirname "$0")/../../sample-receivers/Calvex Q9 USB"
+copy_from="$(dirname "$0")/../../sample-receivers/Calvex Q9 USB" widen=1
 walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
-copy_from=""
+copy_from="" widen=""
 walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
 
 [ $fail -eq 0 ] || { echo "--- the namespace"; echo "$tree"; echo "--- the last view"; echo "$view"; }

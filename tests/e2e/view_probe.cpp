@@ -1,6 +1,7 @@
 // Guards against a view that Explorer shows with missing rows, columns or cell texts: reads our list control from outside.
 // view_probe: finds the extension's view window in any process of this Wine session and
-// prints what its list control shows: "columns: a|b|c", then "row: a|b|c" per item, UTF-8.
+// prints what its list control shows: "columns: a|b|c", "widths: 100|100|100", then
+// "row: a|b|c" per item, UTF-8.
 // The list lives in Explorer's process, so the list-view messages carry a buffer allocated
 // there; its owner fills the texts on demand, exactly as when it paints them.
 #include <windows.h>
@@ -105,6 +106,10 @@ int main() {
     }
     const std::vector<std::wstring> titles = Columns(list, block);
     PrintRow("columns", titles);
+    std::vector<std::wstring> widths;
+    for (size_t i = 0; i < titles.size(); ++i)
+        widths.push_back(std::to_wstring(SendMessageW(list, LVM_GETCOLUMNWIDTH, i, 0)));
+    PrintRow("widths", widths);
     const int rows = static_cast<int>(SendMessageW(list, LVM_GETITEMCOUNT, 0, 0));
     const int columns = titles.empty() ? 1 : static_cast<int>(titles.size());
     for (int row = 0; row < rows; ++row) {
