@@ -1,21 +1,11 @@
-// Guards the folder's view hosted in a browser of our own against the simulator: wrong cell texts, columns, status text, menus, command results, sort state, refresh paths and leaked windows.
-#include <windows.h>
-#include <commctrl.h>
-#include <docobj.h>
-#include <shlobj.h>
-
+// Guards the folder's view hosted in a browser of our own against the simulator: wrong status texts, menus and their states, command HRESULTs, view-state bytes, sort state, delete and properties, refresh paths, device manager faults and leaks.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <atomic>
-#include <functional>
-#include <memory>
 #include <thread>
-#include <string>
-#include <vector>
 
-#include "com/ComPtr.h"
 #include "com/ModuleLock.h"
-#include "folder/IReceiversShellFolderImpl.h"
 #include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "module/ModuleState.h"
@@ -26,148 +16,108 @@
 using namespace testsupport;
 
 namespace {
+using MenuRows = std::vector<std::pair<UINT, UINT>>;  // id (0 for a separator), state
+const char kRefreshed[] = "CCalvexReceiversShellView::Refresh\r\n";
+
 // The browser that hosts the view: a frame window, File/Edit/View menus carrying the shell's
-// ids, and a record of what the view asks of it.
+// ids, and a record of what the view asks of it. It lives on the test's stack.
 class TestBrowser : public IShellBrowser, public ICommDlgBrowser {
 public:
-    explicit TestBrowser(bool fileDialog) : m_fileDialog(fileDialog) {
-        m_frame = CreateWindowExW(0, L"STATIC", L"frame", WS_OVERLAPPEDWINDOW | WS_VISIBLE, 0, 0, 700, 500, nullptr,
-                                  nullptr, nullptr, nullptr);
-    }
-    virtual ~TestBrowser() { DestroyWindow(m_frame); }
+    explicit TestBrowser(bool fileDialog = false) : fileDialog(fileDialog) {}
+    virtual ~TestBrowser() { DestroyWindow(frame); }
     STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override {
-        *ppv = nullptr;
+        const bool dialog = fileDialog && IsEqualIID(riid, IID_ICommDlgBrowser);
+        *ppv = dialog ? static_cast<ICommDlgBrowser*>(this) : nullptr;
         if (IsEqualIID(riid, IID_IUnknown) || IsEqualIID(riid, IID_IShellBrowser) || IsEqualIID(riid, IID_IOleWindow))
             *ppv = static_cast<IShellBrowser*>(this);
-        else if (m_fileDialog && IsEqualIID(riid, IID_ICommDlgBrowser))
-            *ppv = static_cast<ICommDlgBrowser*>(this);
-        if (!*ppv) return E_NOINTERFACE;
-        AddRef();
-        return S_OK;
+        if (*ppv) AddRef();
+        return *ppv ? S_OK : E_NOINTERFACE;
     }
-    STDMETHODIMP_(ULONG) AddRef() override { return ++m_refs; }
-    STDMETHODIMP_(ULONG) Release() override { return --m_refs; }  // lives on the test's stack
-    STDMETHODIMP GetWindow(HWND* hwnd) override { *hwnd = m_frame; return S_OK; }
-    STDMETHODIMP ContextSensitiveHelp(BOOL) override { return E_NOTIMPL; }
+    STDMETHODIMP_(ULONG) AddRef() override { return ++refs; }
+    STDMETHODIMP_(ULONG) Release() override { return --refs; }
+    STDMETHODIMP GetWindow(HWND* hwnd) override { *hwnd = frame; return S_OK; }
     STDMETHODIMP InsertMenusSB(HMENU menu, LPOLEMENUGROUPWIDTHS) override {
-        const UINT ids[] = {FCIDM_MENU_FILE, FCIDM_MENU_EDIT, FCIDM_MENU_VIEW};
-        for (UINT id : ids) {
+        for (UINT id : {FCIDM_MENU_FILE, FCIDM_MENU_EDIT, FCIDM_MENU_VIEW}) {
             HMENU sub = CreatePopupMenu();
             if (id == FCIDM_MENU_VIEW) AppendMenuW(sub, MF_SEPARATOR, FCIDM_MENU_VIEW_SEP_OPTIONS, nullptr);
             if (id == FCIDM_MENU_EDIT) AppendMenuW(sub, MF_STRING, 0x7001, L"Undo");
-            MENUITEMINFOW item = {sizeof(item), MIIM_ID | MIIM_SUBMENU | MIIM_STRING};
-            item.wID = id;
-            item.hSubMenu = sub;
+            MENUITEMINFOW item = {sizeof(item), MIIM_ID | MIIM_SUBMENU | MIIM_STRING, 0, 0, id, sub};
             item.dwTypeData = const_cast<wchar_t*>(L"x");
             InsertMenuItemW(menu, GetMenuItemCount(menu), TRUE, &item);
         }
         return S_OK;
     }
     STDMETHODIMP SetMenuSB(HMENU menu, HOLEMENU, HWND) override { lastMenu = menu; return S_OK; }
-    STDMETHODIMP RemoveMenusSB(HMENU) override { return S_OK; }
-    STDMETHODIMP SetStatusTextSB(LPCWSTR) override { return E_NOTIMPL; }
-    STDMETHODIMP EnableModelessSB(BOOL) override { return E_NOTIMPL; }
-    STDMETHODIMP TranslateAcceleratorSB(MSG*, WORD) override { return E_NOTIMPL; }
-    STDMETHODIMP BrowseObject(PCUIDLIST_RELATIVE, UINT flags) override { browseFlags.push_back(flags); return S_OK; }
+    STDMETHODIMP BrowseObject(PCUIDLIST_RELATIVE, UINT) override { return S_OK; }
     STDMETHODIMP GetViewStateStream(DWORD, IStream** stream) override {
-        *stream = nullptr;
-        if (!viewState) return E_FAIL;
-        LARGE_INTEGER zero = {};
-        viewState->Seek(zero, STREAM_SEEK_SET, nullptr);
         viewState.CopyTo(stream);
-        return S_OK;
+        return viewState ? viewState->Seek(LARGE_INTEGER{}, STREAM_SEEK_SET, nullptr) : E_FAIL;
     }
-    STDMETHODIMP GetControlWindow(UINT, HWND*) override { return E_NOTIMPL; }
     STDMETHODIMP SendControlMsg(UINT control, UINT message, WPARAM, LPARAM lParam, LRESULT*) override {
         if (control == FCW_STATUS && message == SB_SETTEXTW) statusText = reinterpret_cast<const wchar_t*>(lParam);
         return S_OK;
     }
+    STDMETHODIMP ContextSensitiveHelp(BOOL) override { return E_NOTIMPL; }
+    STDMETHODIMP SetStatusTextSB(LPCWSTR) override { return E_NOTIMPL; }
+    STDMETHODIMP EnableModelessSB(BOOL) override { return E_NOTIMPL; }
+    STDMETHODIMP TranslateAcceleratorSB(MSG*, WORD) override { return E_NOTIMPL; }
+    STDMETHODIMP GetControlWindow(UINT, HWND*) override { return E_NOTIMPL; }
     STDMETHODIMP QueryActiveShellView(IShellView**) override { return E_NOTIMPL; }
+    STDMETHODIMP RemoveMenusSB(HMENU) override { return S_OK; }
     STDMETHODIMP OnViewWindowActive(IShellView*) override { return S_OK; }
     STDMETHODIMP SetToolbarItems(LPTBBUTTONSB, UINT, UINT) override { return S_OK; }
-    // ICommDlgBrowser
     STDMETHODIMP OnDefaultCommand(IShellView*) override { return S_OK; }
     STDMETHODIMP OnStateChange(IShellView*, ULONG) override { return S_OK; }
     STDMETHODIMP IncludeObject(IShellView*, PCUITEMID_CHILD) override { return S_OK; }
 
-    HWND m_frame;
-    bool m_fileDialog;
-    ULONG m_refs = 0;
+    bool fileDialog;
+    HWND frame = CreateWindowExW(0, L"STATIC", L"frame", WS_OVERLAPPEDWINDOW | WS_VISIBLE, 0, 0, 700, 500, nullptr,
+                                 nullptr, nullptr, nullptr);
+    ULONG refs = 0;
     HMENU lastMenu = nullptr;
     std::wstring statusText;
-    std::vector<UINT> browseFlags;
     ComPtr<IStream> viewState;
 };
 
-ComPtr<IShellFolder> RootFolder(bool brennor = false) {
-    ComPtr<IShellFolder> root;
+// Our root folder of either brand, or its first receiver's folder; null when there is none.
+ComPtr<IShellFolder> OurFolder(bool files, bool brennor = false) {
+    ComPtr<IShellFolder> root, receiver;
     (brennor ? CreateBrennorReceiversShellFolder : CreateCalvexReceiversShellFolder)(nullptr, IID_IShellFolder,
                                                                                      root.PutVoid());
     ComPtr<IPersistFolder> persist;
     root.QueryTo(IID_IPersistFolder, persist.PutVoid());
     persist->Initialize(nullptr);
-    return root;
-}
-
-ComPtr<IShellFolder> FirstReceiver(IShellFolder* root) {
-    ComPtr<IEnumIDList> enumerator;
-    root->EnumObjects(nullptr, SHCONTF_FOLDERS, &enumerator);
-    LPITEMIDLIST item = nullptr;
-    ComPtr<IShellFolder> receiver;
-    if (enumerator && enumerator->Next(1, &item, nullptr) == S_OK) {
-        root->BindToObject(item, nullptr, IID_IShellFolder, receiver.PutVoid());
-        CoTaskMemFree(item);
-    }
+    if (!files) return root;
+    std::vector<TaskPidl> items = ListItems(root.Get(), SHCONTF_FOLDERS);
+    if (!items.empty()) root->BindToObject(items[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid());
     return receiver;
 }
 
-// One view of a folder in a browser, destroyed at the end of its scope.
+// One view of a folder in a browser, destroyed at the end of its scope; the folder is not
+// kept here, so the view must hold it.
 struct HostedView {
-    HostedView(IShellFolder* folder, TestBrowser& browser, UINT mode = FVM_DETAILS, IShellView* previous = nullptr) {
+    HostedView(ComPtr<IShellFolder> folder, TestBrowser& browser, UINT mode = FVM_DETAILS, IShellView* previous = nullptr) {
         EXPECT_EQ(S_OK, folder->CreateViewObject(nullptr, IID_IShellView, view.PutVoid()));
         FOLDERSETTINGS settings = {mode, 0};
         RECT rect = {0, 0, 600, 400};
         EXPECT_EQ(S_OK, view->CreateViewWindow(previous, &settings, &browser, &rect, &window));
         list = GetDlgItem(window, 2000);
     }
-    ~HostedView() {
-        if (view) view->DestroyViewWindow();
-    }
-    CCalvexReceiversShellView* Object() const {
-        return static_cast<CCalvexReceiversShellView*>(view.Get());
-    }
-    int Count() const { return static_cast<int>(SendMessageW(list, LVM_GETITEMCOUNT, 0, 0)); }
+    ~HostedView() { view->DestroyViewWindow(); }
+    CCalvexReceiversShellView* Object() const { return static_cast<CCalvexReceiversShellView*>(view.Get()); }
+    int Count() const { return ListView_GetItemCount(list); }
     std::wstring Cell(int item, int column) const {
         wchar_t text[260] = L"";
-        LVITEMW entry = {};
-        entry.iSubItem = column;
-        entry.pszText = text;
-        entry.cchTextMax = 260;
-        SendMessageW(list, LVM_GETITEMTEXTW, item, reinterpret_cast<LPARAM>(&entry));
+        ListView_GetItemText(list, item, column, text, 260);
         return text;
     }
-    std::wstring Header(int column, int* width) const {
-        wchar_t text[64] = L"";
-        LVCOLUMNW entry = {LVCF_TEXT | LVCF_WIDTH};
-        entry.pszText = text;
-        entry.cchTextMax = 64;
-        if (!SendMessageW(list, LVM_GETCOLUMNW, column, reinterpret_cast<LPARAM>(&entry))) return L"<none>";
-        *width = entry.cx;
-        return text;
-    }
-    void Select(int item) const {
-        LVITEMW state = {};
-        state.stateMask = LVIS_SELECTED;
-        state.state = LVIS_SELECTED;
-        SendMessageW(list, LVM_SETITEMSTATE, item, reinterpret_cast<LPARAM>(&state));
-    }
+    void Select(int item) const { ListView_SetItemState(list, item, LVIS_SELECTED, LVIS_SELECTED); }
     ComPtr<IShellView> view;
-    HWND window = nullptr;
-    HWND list = nullptr;
+    HWND window = nullptr, list = nullptr;
 };
 
-std::vector<std::pair<UINT, UINT>> MenuItems(HMENU menu) {  // id, state
-    std::vector<std::pair<UINT, UINT>> items;
+MenuRows MenuItems(HMENU menu) {
+    MenuRows items;
     for (int i = 0; i < GetMenuItemCount(menu); ++i) {
         MENUITEMINFOW item = {sizeof(item), MIIM_ID | MIIM_STATE | MIIM_FTYPE};
         GetMenuItemInfoW(menu, i, TRUE, &item);
@@ -176,43 +126,9 @@ std::vector<std::pair<UINT, UINT>> MenuItems(HMENU menu) {  // id, state
     return items;
 }
 
-HMENU SubMenu(HMENU menu, UINT id) {
-    MENUITEMINFOW item = {sizeof(item), MIIM_SUBMENU};
-    GetMenuItemInfoW(menu, id, FALSE, &item);
-    return item.hSubMenu;
-}
-
 size_t CountTrace(const std::string& line) {
-    size_t count = 0;
-    for (const std::string& message : TraceMessages()) count += message == line;
-    return count;
-}
-
-
-// Runs action on this thread while another thread reads and closes every dialog titled
-// title that it opens (a message box or the properties sheet); returns what was read.
-std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
-                                            const std::function<std::wstring(HWND)>& read) {
-    std::vector<std::wstring> seen;
-    std::atomic<bool> done(false);
-    std::thread closer([&] {
-        HWND last = nullptr;
-        while (!done) {
-            HWND dialog = FindWindowW(L"#32770", title);
-            if (dialog && dialog != last && IsWindowVisible(dialog)) {
-                Sleep(200);  // let it finish initialising
-                seen.push_back(read(dialog));
-                last = dialog;
-                PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
-                PostMessageW(dialog, WM_COMMAND, IDOK, 0);
-            }
-            Sleep(50);
-        }
-    });
-    action();
-    done = true;
-    closer.join();
-    return seen;
+    const std::vector<std::string> messages = TraceMessages();
+    return std::count(messages.begin(), messages.end(), line);
 }
 
 std::wstring ChildText(HWND parent, int id) {
@@ -221,92 +137,80 @@ std::wstring ChildText(HWND parent, int id) {
     return text;
 }
 
+// Runs action on this thread while another thread reads and closes every dialog titled
+// title that it opens (a message box or the properties sheet); returns what was read.
+std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
+                                            const std::function<std::wstring(HWND)>& read) {
+    std::vector<std::wstring> seen;
+    std::atomic<bool> done(false);
+    std::thread closer([&] {
+        for (HWND last = nullptr; !done; Sleep(50)) {
+            HWND dialog = FindWindowW(L"#32770", title);
+            if (!dialog || dialog == last || !IsWindowVisible(dialog)) continue;
+            Sleep(200);  // let it finish initialising
+            seen.push_back(read(last = dialog));
+            PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
+            PostMessageW(dialog, WM_COMMAND, IDOK, 0);
+        }
+    });
+    action();
+    done = true;
+    closer.join();
+    return seen;
+}
+
 class ShellViewTest : public testing::Test {
 protected:
     static void SetUpTestSuite() { ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized()); }
     void SetUp() override {
-        ReceiverSetup setup;
-        setup.folder = L"Calvex A";
-        tree.AddReceiver(setup);
-        setup.folder = L"Brennor A";
-        setup.brand = 2;
-        setup.serialNumber = L"2000-0001";
-        tree.AddReceiver(setup);
-        tree.AddFile(L"Calvex A", L"LOG0001", 100);
-        tree.AddFile(L"Calvex A", L"LOG0002", 1536);
-        tree.AddFile(L"Calvex A", L"LOG0003", 2048);
+        tree.AddReceiver({L"Calvex A"});
+        tree.AddReceiver({L"Brennor A", 2, L"Test receiver", L"2000-0001"});
+        const size_t sizes[] = {100, 1536, 2048};
+        for (int i = 0; i < 3; ++i) tree.AddFile(L"Calvex A", L"LOG000" + std::to_wstring(i + 1), sizes[i]);
         scope.reset(new DeviceSimScope(tree.Root()));
         Display() = DisplayState();
     }
-    void TearDown() override { scope.reset(); }
+    // A view of our root folder or of its first receiver in the test's browser.
+    HostedView& Host(bool files, UINT mode = FVM_DETAILS, IShellView* previous = nullptr) {
+        hosts.emplace_back(new HostedView(OurFolder(files), browser, mode, previous));
+        return *hosts.back();
+    }
+    // Ended in reverse: the views first, the simulator before its tree.
     ReceiverTree tree;
     std::unique_ptr<DeviceSimScope> scope;
+    TestBrowser browser;
+    std::vector<std::unique_ptr<HostedView>> hosts;
 };
 }  // namespace
 
-TEST_F(ShellViewTest, BothLevelsShowTheirColumnsItemsAndStatusText) {
-    Display().NameColumnWidth = 120;
-    Display().SecondColumnWidth = 170;
-    ComPtr<IShellFolder> root = RootFolder();
-    ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
-    ASSERT_TRUE(receiver);
-    TestBrowser browser(false);
-    struct Case {
-        const char* level;
-        IShellFolder* folder;
-        std::vector<std::pair<std::wstring, int>> columns;
-        std::vector<std::wstring> firstRow;  // from column 1 on
-        std::wstring status;
-    } cases[] = {
-        {"receivers", root.Get(), {{L"Name", 120}, {L"Serial number", 120}, {L"Model", 120}, {L"Port", 120}},
-         {L"1000-0001", L"Q9 GNSS", L"USB"}, L"Calvex GNSS Receivers: Calvex Receivers"},
-        {"files", receiver.Get(), {{L"Name", 120}, {L"Size", 120}, {L"Time", 170}}, {L"100 bytes"},
-         L"Calvex GNSS Receivers: Calvex Receivers\\1000-0001!Q9 GNSS!USB"},
+TEST_F(ShellViewTest, ViewsShowTheirLevelsStatusTextAndLeaveNoWindowGdiObjectLockOrReferenceBehind) {
+    struct { bool files, brennor; const wchar_t* status; } cases[] = {
+        {false, false, L"Calvex GNSS Receivers: Calvex Receivers"},
+        {true, false, L"Calvex GNSS Receivers: Calvex Receivers\\1000-0001!Q9 GNSS!USB"},
+        {false, true, L"Brennor GNSS Receivers: Calvex Receivers"},  // both roots carry that name
+        {true, true, L"Calvex GNSS Receivers: Calvex Receivers\\2000-0001!Q9 GNSS!USB"},
     };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.level);
-        HostedView host(c.folder, browser);
-        for (size_t i = 0; i < c.columns.size(); ++i) {
-            int width = -1;
-            EXPECT_EQ(c.columns[i].first, host.Header(static_cast<int>(i), &width));
-            EXPECT_EQ(c.columns[i].second, width);
+    auto hostEach = [&] {
+        for (const auto& c : cases) {
+            HostedView host(OurFolder(c.files, c.brennor), browser);
+            EXPECT_EQ(S_OK, host.view->UIActivate(c.brennor ? SVUIA_ACTIVATE_FOCUS : SVUIA_ACTIVATE_NOFOCUS));
+            EXPECT_EQ(c.status, browser.statusText);
         }
-        int unused = 0;
-        EXPECT_EQ(L"<none>", host.Header(static_cast<int>(c.columns.size()), &unused));
-        ASSERT_GE(host.Count(), 1);
-        EXPECT_FALSE(host.Cell(0, 0).empty());
-        for (size_t i = 0; i < c.firstRow.size(); ++i) EXPECT_EQ(c.firstRow[i], host.Cell(0, static_cast<int>(i + 1)));
-        EXPECT_EQ(S_OK, host.view->UIActivate(SVUIA_ACTIVATE_NOFOCUS));
-        EXPECT_EQ(c.status, browser.statusText);
-    }
-    HostedView files(receiver.Get(), browser);
-    EXPECT_EQ(3, files.Count());
-    EXPECT_EQ(L"1.5 KB", files.Cell(1, 1));
-    EXPECT_EQ(L"2.0 KB", files.Cell(2, 1));
-}
-
-TEST_F(ShellViewTest, OnlyABrennorRootGetsTheBrennorStatusPrefix) {
-    ComPtr<IShellFolder> root = RootFolder(true);
-    ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
-    ASSERT_TRUE(receiver);
-    TestBrowser browser(false);
-    const std::pair<IShellFolder*, const wchar_t*> cases[] = {
-        {root.Get(), L"Brennor GNSS Receivers: Calvex Receivers"},  // both roots carry that name
-        {receiver.Get(), L"Calvex GNSS Receivers: Calvex Receivers\\2000-0001!Q9 GNSS!USB"},
     };
-    for (const auto& c : cases) {
-        HostedView host(c.first, browser);
-        host.view->UIActivate(SVUIA_ACTIVATE_FOCUS);
-        EXPECT_EQ(c.second, browser.statusText);
-    }
+    hostEach();  // what stays loaded once is no leak
+    const DWORD gdi = GetGuiResources(GetCurrentProcess(), GR_GDIOBJECTS);
+    const LONG locks = ModuleLock::Count();
+    for (int i = 0; i < 5; ++i) hostEach();
+    EXPECT_EQ(nullptr, FindWindowExW(browser.frame, nullptr, L"CalvexReceiversViewNSClass", nullptr));
+    EXPECT_LE(GetGuiResources(GetCurrentProcess(), GR_GDIOBJECTS), gdi + 5);
+    EXPECT_EQ(locks, ModuleLock::Count());
+    EXPECT_EQ(0u, browser.refs);
 }
 
 TEST_F(ShellViewTest, ModeComesFromOurPreviousViewElseFromTheStreamsFirstFourBytes) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    HostedView first(root.Get(), browser, FVM_LIST);
+    HostedView& first = Host(false, FVM_LIST);
     first.Object()->OnCommand(1284);  // small icons
-    HostedView second(root.Get(), browser, FVM_DETAILS, first.view.Get());
+    HostedView& second = Host(false, FVM_DETAILS, first.view.Get());
     FOLDERSETTINGS settings = {};
     second.view->GetCurrentInfo(&settings);
     EXPECT_EQ(static_cast<UINT>(FVM_SMALLICON), settings.ViewMode);
@@ -314,116 +218,81 @@ TEST_F(ShellViewTest, ModeComesFromOurPreviousViewElseFromTheStreamsFirstFourByt
 
     // Another kind of previous view: the stream gives the mode, the flags stay ours.
     CreateStreamOnHGlobal(nullptr, TRUE, &browser.viewState);
-    const DWORD saved[2] = {FVM_LIST, 0xFFFF};
-    browser.viewState->Write(saved, sizeof(saved), nullptr);
+    DWORD stored[2] = {FVM_LIST, 0xFFFF};
+    browser.viewState->Write(stored, sizeof(stored), nullptr);
     ComPtr<IShellView> foreign;
     ComPtr<IShellFolder> desktop;
     SHGetDesktopFolder(&desktop);
-    desktop->CreateViewObject(browser.m_frame, IID_IShellView, foreign.PutVoid());
+    desktop->CreateViewObject(browser.frame, IID_IShellView, foreign.PutVoid());
     ASSERT_TRUE(foreign);
-    HostedView fourth(root.Get(), browser, FVM_DETAILS, foreign.Get());
-    fourth.view->GetCurrentInfo(&settings);
+    HostedView& third = Host(false, FVM_DETAILS, foreign.Get());
+    third.view->GetCurrentInfo(&settings);
     EXPECT_EQ(static_cast<UINT>(FVM_LIST), settings.ViewMode);
     EXPECT_EQ(0u, settings.fFlags);
-    fourth.Object()->OnCommand(1283);
-    EXPECT_EQ(S_OK, fourth.view->SaveViewState());
-    DWORD stored[2] = {};
-    LARGE_INTEGER zero = {};
-    browser.viewState->Seek(zero, STREAM_SEEK_SET, nullptr);
+    third.Object()->OnCommand(1283);
+    EXPECT_EQ(S_OK, third.view->SaveViewState());
+    browser.viewState->Seek(LARGE_INTEGER{}, STREAM_SEEK_SET, nullptr);
     browser.viewState->Read(stored, sizeof(stored), nullptr);
     EXPECT_EQ(static_cast<DWORD>(FVM_ICON), stored[0]);
     EXPECT_EQ(0xFFFFu, stored[1]);
 }
 
-TEST_F(ShellViewTest, MenusAreMergedWithTheirPositionsAndStates) {
-    ComPtr<IShellFolder> root = RootFolder();
-    ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
-    ASSERT_TRUE(receiver) << "the sample tree has a receiver";
-    struct Case {
-        const char* name;
-        IShellFolder* folder;
-        bool fileDialog;
-        bool select;
-        std::vector<std::pair<UINT, UINT>> file;
-    } cases[] = {
-        {"receivers", root.Get(), false, false, {{1289, MFS_DEFAULT | MFS_GRAYED}, {0, MFS_GRAYED}, {1287, MFS_GRAYED}}},
-        {"receivers selected", root.Get(), false, true, {{1289, MFS_DEFAULT}, {0, MFS_GRAYED}, {1287, 0}}},
-        {"files", receiver.Get(), false, false, {{1289, MFS_DEFAULT | MFS_GRAYED}, {1288, MFS_GRAYED}, {0, MFS_GRAYED}}},
-        {"files in a file dialog", receiver.Get(), true, true, {{1289, MFS_DEFAULT}, {1288, 0}, {0, MFS_GRAYED}}},
+TEST_F(ShellViewTest, MenusAndTheRightClickMenuHaveTheirPositionsAndStates) {
+    struct { const char* name; bool files, fileDialog, select; MenuRows file; } cases[] = {
+        {"receivers", false, false, false, {{1289, MFS_DEFAULT | MFS_GRAYED}, {0, MFS_GRAYED}, {1287, MFS_GRAYED}}},
+        {"receivers selected", false, false, true, {{1289, MFS_DEFAULT}, {0, MFS_GRAYED}, {1287, 0}}},
+        {"files", true, false, false, {{1289, MFS_DEFAULT | MFS_GRAYED}, {1288, MFS_GRAYED}, {0, MFS_GRAYED}}},
+        {"files in a file dialog", true, true, true, {{1289, MFS_DEFAULT}, {1288, 0}, {0, MFS_GRAYED}}},
     };
-    for (const Case& c : cases) {
+    // Ours go before the browser's options separator, which stays last.
+    const MenuRows view = {{0, MFS_GRAYED}, {1283, 0}, {1284, 0}, {1285, 0}, {1286, MFS_CHECKED}, {0, MFS_GRAYED}};
+    for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
         TestBrowser browser(c.fileDialog);
-        HostedView host(c.folder, browser);
+        HostedView host(OurFolder(c.files), browser);
         if (c.select) host.Select(0);
         host.view->UIActivate(SVUIA_ACTIVATE_FOCUS);
         ASSERT_TRUE(browser.lastMenu);
-        HMENU file = SubMenu(browser.lastMenu, FCIDM_MENU_FILE);
+        HMENU file = GetSubMenu(browser.lastMenu, 0);  // the browser's File, Edit and View, in that order
         EXPECT_EQ(c.file, MenuItems(file));
         wchar_t text[64] = L"";
         GetMenuStringW(file, 1289, text, 64, MF_BYCOMMAND);
         EXPECT_STREQ(c.fileDialog ? L"Select" : L"Open", text);
-        // Ours go before the browser's options separator, which stays last.
-        std::vector<std::pair<UINT, UINT>> view = {{0, MFS_GRAYED}, {1283, 0}, {1284, 0}, {1285, 0}, {1286, MFS_CHECKED}};
-        std::vector<std::pair<UINT, UINT>> merged = MenuItems(SubMenu(browser.lastMenu, FCIDM_MENU_VIEW));
-        ASSERT_EQ(6u, merged.size());
-        merged.pop_back();
-        EXPECT_EQ(view, merged);
-        const bool files = c.folder == receiver.Get();
-        std::vector<std::pair<UINT, UINT>> edit;
-        if (files) edit = {{0, MFS_GRAYED}, {1281, c.select ? 0u : MFS_GRAYED}};
-        EXPECT_EQ(edit, MenuItems(SubMenu(browser.lastMenu, FCIDM_MENU_EDIT)));
+        EXPECT_EQ(view, MenuItems(GetSubMenu(browser.lastMenu, 2)));
+        const MenuRows edit = c.files ? MenuRows{{0, MFS_GRAYED}, {1281, c.select ? 0u : MFS_GRAYED}} : MenuRows{};
+        EXPECT_EQ(edit, MenuItems(GetSubMenu(browser.lastMenu, 1)));
     }
-}
-
-TEST_F(ShellViewTest, RightClickOnEmptySpaceAtFilesLevelHasCopyAndViewGroups) {
-    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
-    TestBrowser browser(false);
-    HostedView host(receiver.Get(), browser);
-    UniqueMenu menu(host.Object()->BuildContextMenu());
-    // No open group, and no separator ahead of "&Copy" in a menu that is still empty.
-    std::vector<std::pair<UINT, UINT>> expected = {{1281, MFS_GRAYED}, {0, MFS_GRAYED}, {22, 0}, {1283, 0},
-                                                   {1284, 0},          {1285, 0},       {1286, MFS_CHECKED}};
-    EXPECT_EQ(expected, MenuItems(menu.Get()));
+    // Right-click on the files' empty space: no open group, and no separator ahead of "&Copy".
+    UniqueMenu context(Host(true).Object()->BuildContextMenu());
+    EXPECT_EQ((MenuRows{{1281, MFS_GRAYED}, {0, MFS_GRAYED}, {22, 0}, {1283, 0}, {1284, 0}, {1285, 0}, {1286, MFS_CHECKED}}),
+              MenuItems(context.Get()));
 }
 
 TEST_F(ShellViewTest, CommandTargetAnswersAcceptedGroupsAndExecutesEveryGroup) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    HostedView host(root.Get(), browser);
     ComPtr<IOleCommandTarget> target;
-    host.view.QueryTo(IID_IOleCommandTarget, target.PutVoid());
+    Host(false).view.QueryTo(IID_IOleCommandTarget, target.PutVoid());
     const GUID unknown = {0x12345678, 0, 0, {0, 0, 0, 0, 0, 0, 0, 1}};
     const GUID calvex = {0xE102076F, 0x4057, 0x4E7F, {0x82, 0x09, 0x51, 0x12, 0x58, 0xF1, 0x2B, 0x62}};
-    struct Case {
-        const GUID* group;
-        HRESULT expected;
-    } cases[] = {{nullptr, S_OK}, {&calvex, S_OK}, {&CGID_Explorer, S_OK}, {&CGID_ShellDocView, S_OK},
-                 {&unknown, OLECMDERR_E_UNKNOWNGROUP}};
-    for (const Case& c : cases) {
+    const std::pair<const GUID*, HRESULT> cases[] = {{nullptr, S_OK}, {&calvex, S_OK}, {&CGID_Explorer, S_OK},
+                                                     {&CGID_ShellDocView, S_OK}, {&unknown, OLECMDERR_E_UNKNOWNGROUP}};
+    for (const auto& c : cases) {
         OLECMD commands[] = {{10, 7}, {12, 7}, {22, 7}, {11, 7}};
-        EXPECT_EQ(c.expected, target->QueryStatus(c.group, 4, commands, nullptr));
-        const DWORD on = c.expected == S_OK ? OLECMDF_SUPPORTED | OLECMDF_ENABLED : 7;
+        EXPECT_EQ(c.second, target->QueryStatus(c.first, 4, commands, nullptr));
+        const DWORD on = c.second == S_OK ? OLECMDF_SUPPORTED | OLECMDF_ENABLED : 7;
         EXPECT_EQ(on, commands[0].cmdf);
         EXPECT_EQ(on, commands[2].cmdf);
-        EXPECT_EQ(c.expected == S_OK ? 0u : 7u, commands[3].cmdf);
+        EXPECT_EQ(c.second == S_OK ? 0u : 7u, commands[3].cmdf);
     }
     EXPECT_EQ(E_POINTER, target->QueryStatus(nullptr, 1, nullptr, nullptr));
-    const size_t before = CountTrace("CCalvexReceiversShellView::Refresh\r\n");
+    const size_t before = CountTrace(kRefreshed);
     EXPECT_EQ(S_OK, target->Exec(&unknown, 22, 0, nullptr, nullptr));
-    EXPECT_EQ(before + 1, CountTrace("CCalvexReceiversShellView::Refresh\r\n"));
+    EXPECT_EQ(before + 1, CountTrace(kRefreshed));
 }
 
 TEST_F(ShellViewTest, ColumnClicksShareOneSortStateAcrossViews) {
-    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
-    TestBrowser browser(false);
-    HostedView first(receiver.Get(), browser), second(receiver.Get(), browser);
+    HostedView &first = Host(true), &second = Host(true);
     auto click = [](HostedView& host, int column) {
-        NMLISTVIEW notify = {};
-        notify.hdr.hwndFrom = host.list;
-        notify.hdr.idFrom = 2000;
-        notify.hdr.code = LVN_COLUMNCLICK;
-        notify.iSubItem = column;
+        NMLISTVIEW notify = {{host.list, 2000, LVN_COLUMNCLICK}, 0, column};
         SendMessageW(host.window, WM_NOTIFY, 2000, reinterpret_cast<LPARAM>(&notify));
         return host.Cell(0, 0);
     };
@@ -434,125 +303,56 @@ TEST_F(ShellViewTest, ColumnClicksShareOneSortStateAcrossViews) {
     EXPECT_EQ(L"LOG0003.qpr", click(first, 1));
 }
 
-TEST_F(ShellViewTest, EndTrackStoresFirstAndSecondColumnWidths) {
-    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
-    TestBrowser browser(false);
-    HostedView host(receiver.Get(), browser);
-    SendMessageW(host.list, LVM_SETCOLUMNWIDTH, 0, 90);
-    SendMessageW(host.list, LVM_SETCOLUMNWIDTH, 1, 140);
-    SendMessageW(host.list, LVM_SETCOLUMNWIDTH, 2, 33);
-    NMHEADERW notify = {};
-    notify.hdr.code = HDN_ENDTRACKW;
-    SendMessageW(host.window, WM_NOTIFY, 0, reinterpret_cast<LPARAM>(&notify));
-    EXPECT_EQ(90, Display().NameColumnWidth);
-    EXPECT_EQ(140, Display().SecondColumnWidth);  // "Size" gives "Time" its width
-}
-
-TEST_F(ShellViewTest, DeletingThreeFilesRefreshesThreeTimesAndOpenBrowsesRelative) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    {
-        HostedView receivers(root.Get(), browser);
-        receivers.Select(0);
-        receivers.Object()->OnCommand(1289);
-        EXPECT_EQ(std::vector<UINT>{SBSP_RELATIVE}, browser.browseFlags);
+TEST_F(ShellViewTest, DeleteGoesOnPastRefusalsWithOneBoxEach) {
+    // Items selected (-1: all), message boxes, refreshes and items left after the delete.
+    struct { HRESULT failure; std::vector<int> selected; size_t boxes, refreshes; int left; } cases[] = {
+        {E_ACCESSDENIED, {0, 2}, 2, 2, 3}, {S_OK, {-1}, 0, 3, 0}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.failure);
+        DeviceSimScope faults(tree.Root());
+        if (FAILED(c.failure)) SetDeviceSimCallFailure(L"IReceiverFile.Delete", c.failure);
+        HostedView host(OurFolder(true), browser);
+        ASSERT_EQ(3, host.Count());
+        for (int item : c.selected) host.Select(item);
+        const size_t before = CountTrace(kRefreshed);
+        std::vector<std::wstring> boxes = WithDialogsClosed(
+            L"Delete", [&] { host.Object()->OnCommand(1288); }, [](HWND box) { return ChildText(box, 0xFFFF); });
+        EXPECT_EQ(c.boxes, boxes.size());
+        for (const std::wstring& text : boxes) EXPECT_FALSE(text.empty());  // the system's text for the refusal
+        EXPECT_EQ(before + c.refreshes, CountTrace(kRefreshed));
+        EXPECT_EQ(c.left, host.Count());
+        EXPECT_EQ(c.left != 0, FileExists(tree.FolderPath(L"Calvex A") + L"\\LOG0001"));
     }
-    ComPtr<IShellFolder> receiver = FirstReceiver(root.Get());
-    HostedView host(receiver.Get(), browser);
-    ASSERT_EQ(3, host.Count());
-    host.Select(-1);
-    const size_t before = CountTrace("CCalvexReceiversShellView::Refresh\r\n");
-    host.Object()->OnCommand(1288);
-    EXPECT_EQ(before + 3, CountTrace("CCalvexReceiversShellView::Refresh\r\n"));
-    EXPECT_EQ(0, host.Count());
-    EXPECT_FALSE(FileExists(tree.FolderPath(L"Calvex A") + L"\\LOG0002.qpr"));
-}
-
-TEST_F(ShellViewTest, FolderMessageRefillsTheListAfterTheTreeChanges) {
-    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
-    TestBrowser browser(false);
-    HostedView host(receiver.Get(), browser);
-    ASSERT_EQ(3, host.Count());
-    tree.AddFile(L"Calvex A", L"LOG0004", 10);
-    EXPECT_TRUE(PumpUntil([&] { return host.Count() == 4; }, 8000));
-    tree.RemoveFile(L"Calvex A", L"LOG0001");
-    EXPECT_TRUE(PumpUntil([&] { return host.Count() == 3; }, 8000));
-}
-
-TEST_F(ShellViewTest, ManyViewsLeaveNoWindowGdiObjectOrLockBehind) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    { HostedView warmUp(root.Get(), browser); }
-    const DWORD gdi = GetGuiResources(GetCurrentProcess(), GR_GDIOBJECTS);
-    const LONG locks = ModuleLock::Count();
-    for (int i = 0; i < 200; ++i) {
-        HostedView host(root.Get(), browser);
-        host.view->UIActivate(SVUIA_ACTIVATE_FOCUS);
-    }
-    EXPECT_EQ(nullptr, FindWindowExW(browser.m_frame, nullptr, L"CalvexReceiversViewNSClass", nullptr));
-    EXPECT_LE(GetGuiResources(GetCurrentProcess(), GR_GDIOBJECTS), gdi + 5);
-    EXPECT_EQ(locks, ModuleLock::Count());
-}
-
-TEST_F(ShellViewTest, RefusedDeleteShowsOneBoxPerFileAndGoesOn) {
-    SetDeviceSimCallFailure(L"IReceiverFile.Delete", E_ACCESSDENIED);
-    ComPtr<IShellFolder> receiver = FirstReceiver(RootFolder().Get());
-    TestBrowser browser(false);
-    HostedView host(receiver.Get(), browser);
-    ASSERT_EQ(3, host.Count());
-    host.Select(0);
-    host.Select(2);
-    const size_t before = CountTrace("CCalvexReceiversShellView::Refresh\r\n");
-    std::vector<std::wstring> boxes = WithDialogsClosed(
-        L"Delete", [&] { host.Object()->OnCommand(1288); }, [](HWND box) { return ChildText(box, 0xFFFF); });
-    ASSERT_EQ(2u, boxes.size());
-    EXPECT_FALSE(boxes[0].empty());  // the system's text for the refusal
-    EXPECT_EQ(before + 2, CountTrace("CCalvexReceiversShellView::Refresh\r\n"));
-    EXPECT_EQ(3, host.Count());
 }
 
 TEST_F(ShellViewTest, PropertiesOpenOneSheetWithTheReceiversTexts) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    HostedView host(root.Get(), browser);
+    HostedView& host = Host(false);
     host.Select(0);
     std::vector<std::wstring> sheets = WithDialogsClosed(
         L"Properties", [&] { host.Object()->OnCommand(1287); },
         [](HWND sheet) {
-            HWND tabs = reinterpret_cast<HWND>(SendMessageW(sheet, PSM_GETTABCONTROL, 0, 0));
             wchar_t tab[64] = L"";
-            TCITEMW item = {TCIF_TEXT};
-            item.pszText = tab;
-            item.cchTextMax = 64;
-            SendMessageW(tabs, TCM_GETITEMW, 0, reinterpret_cast<LPARAM>(&item));
-            HWND page = reinterpret_cast<HWND>(SendMessageW(sheet, PSM_GETCURRENTPAGEHWND, 0, 0));
+            TCITEMW item = {TCIF_TEXT, 0, 0, tab, 64};
+            TabCtrl_GetItem(PropSheet_GetTabControl(sheet), 0, &item);
             std::wstring texts = tab;
-            const int ids[] = {1015, 261, 1016, 262, 1017, 263, 1018, 264};
-            for (int id : ids) texts += L"|" + ChildText(page, id);
+            for (int id : {1015, 261, 1016, 262, 1017, 263, 1018, 264})
+                texts += L"|" + ChildText(PropSheet_GetCurrentPageHwnd(sheet), id);
             return texts;
         });
-    ASSERT_EQ(1u, sheets.size());
-    EXPECT_EQ(L"General|Name|Q9 GNSS@USB|Model|Q9 GNSS|Serial number|1000-0001|Port|USB", sheets[0]);
+    EXPECT_EQ(std::vector<std::wstring>{L"General|Name|Q9 GNSS@USB|Model|Q9 GNSS|Serial number|1000-0001|Port|USB"},
+              sheets);
 }
 
 TEST_F(ShellViewTest, FailingDeviceManagerLeavesTheViewUsable) {
-    struct Case {
-        const wchar_t* call;
-        bool filesLevel;
-        const char* trace;
-    } cases[] = {
+    struct { const wchar_t* call; bool files; const char* trace; } cases[] = {
         {L"IDeviceMgr.get_Receivers", false, "CCalvexReceiversShellView::OnEnumIdList - OK\r\n"},
         {L"IReceiver.get_Files", true, "CCalvexReceiversShellView::Refresh - get files is failed [0x80004005]\r\n"},
     };
-    for (const Case& c : cases) {
+    for (const auto& c : cases) {
         SCOPED_TRACE(Narrow(c.call));
         DeviceSimScope faults(tree.Root());
         SetDeviceSimCallFailure(c.call, E_FAIL);
-        ComPtr<IShellFolder> root = RootFolder();
-        ComPtr<IShellFolder> folder = c.filesLevel ? FirstReceiver(root.Get()) : root;
-        ASSERT_TRUE(folder);
-        TestBrowser browser(false);
-        HostedView host(folder.Get(), browser);
+        HostedView host(OurFolder(c.files), browser);
         const size_t before = CountTrace(c.trace);
         EXPECT_EQ(S_OK, host.view->Refresh());
         EXPECT_EQ(before + 1, CountTrace(c.trace));
@@ -562,43 +362,37 @@ TEST_F(ShellViewTest, FailingDeviceManagerLeavesTheViewUsable) {
     }
 }
 
-TEST_F(ShellViewTest, SearchingDialogCentresItsTextAndGoesWithTheNextFill) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    HostedView host(root.Get(), browser);
+TEST_F(ShellViewTest, TreeChangesRefillTheListAndEndTheCentredSearchingDialog) {
+    HostedView& host = Host(false);
+    ASSERT_EQ(1, host.Count());
     host.Object()->OnCommand(100);
     HWND dialog = FindWindowExW(host.list, nullptr, L"#32770", nullptr);
     ASSERT_TRUE(dialog && IsWindowVisible(dialog));
-    EXPECT_EQ(L"Detecting receivers...", ChildText(dialog, 251));
-    EXPECT_EQ(L"Cancel", ChildText(dialog, IDCANCEL));
+    EXPECT_EQ(L"Detecting receivers...|Cancel", ChildText(dialog, 251) + L"|" + ChildText(dialog, IDCANCEL));
     SendMessageW(dialog, WM_SIZE, 0, MAKELPARAM(400, 300));
     RECT text;
     GetWindowRect(GetDlgItem(dialog, 251), &text);
     MapWindowPoints(nullptr, dialog, reinterpret_cast<POINT*>(&text), 2);
     EXPECT_NEAR(200, (text.left + text.right) / 2, 1);
     EXPECT_NEAR(150, (text.top + text.bottom) / 2, 1);
-    SendMessageW(host.window, ViewNotificationMessage(), 0, 0);
+    tree.AddReceiver({L"Calvex B", 1, L"B", L"1000-0002"});
+    EXPECT_TRUE(PumpUntil([&] { return host.Count() == 2; }, 12000));
     EXPECT_FALSE(IsWindow(dialog));
+    tree.RemoveReceiver(L"Calvex B");
+    EXPECT_TRUE(PumpUntil([&] { return host.Count() == 1; }, 12000));
 }
 
-TEST_F(ShellViewTest, UnreachableDeviceManagerMakesRefreshAnswerFalse) {
-    ComPtr<IShellFolder> root = RootFolder();
-    TestBrowser browser(false);
-    HostedView host(root.Get(), browser);
+TEST_F(ShellViewTest, UnregisteredDeviceManagerMakesRefreshAnswerFalseAndKeepTheItems) {
+    HostedView& host = Host(false);
     const int items = host.Count();
+    const std::wstring simulator = L"\"" + BuildDir() + L"\\CalvexDeviceSim.exe\" ";
+    const char line[] = "CCalvexReceiversShellView::Refresh - access to receiver manager is failed [0x80040154]\r\n";
+    const size_t before = CountTrace(line);
     StopDeviceSimServers();
-    // The class's server points nowhere for the length of the test.
-    const wchar_t key[] = L"CLSID\\{0FADF314-B4FD-413C-9E26-6BC49B066080}\\LocalServer32";
-    wchar_t saved[MAX_PATH] = L"";
-    DWORD size = sizeof(saved);
-    ASSERT_EQ(ERROR_SUCCESS, RegGetValueW(HKEY_CLASSES_ROOT, key, nullptr, RRF_RT_REG_SZ, nullptr, saved, &size));
-    const wchar_t missing[] = L"C:\\missing\\CalvexDeviceSim.exe";
-    RegSetKeyValueW(HKEY_CLASSES_ROOT, key, nullptr, REG_SZ, missing, sizeof(missing));
-    const char line[] = "CCalvexReceiversShellView::Refresh - access to receiver manager is failed [0x";
-    const size_t traced = ReadTraceLog().size();
+    ASSERT_EQ(0u, RunProcess(simulator + L"/UnregServer"));
     const HRESULT refreshed = host.view->Refresh();
-    RegSetKeyValueW(HKEY_CLASSES_ROOT, key, nullptr, REG_SZ, saved, static_cast<DWORD>((wcslen(saved) + 1) * 2));
+    EXPECT_EQ(0u, RunProcess(simulator + L"/RegServer"));
     EXPECT_EQ(S_FALSE, refreshed);
-    EXPECT_NE(std::string::npos, ReadTraceLog().find(line, traced));
+    EXPECT_EQ(before + 1, CountTrace(line));
     EXPECT_EQ(items, host.Count());
 }
