@@ -80,8 +80,8 @@ TEST_F(DataObjectTest, IdListArrayHoldsTheParentThenEachLastItem) {
     LPCITEMIDLIST a = mgr.GetLastItem(first.Get()), b = mgr.GetLastItem(second.Get());
     const UINT sizeA = mgr.GetSize(a), parentSize = mgr.GetSize(first.Get()) - sizeA + 2;  // first, less its file
     const UINT header[] = {2, 16, 16 + parentSize, 16 + parentSize + sizeA};  // cidl, then the offsets
-    EXPECT_EQ(Raw(header, 16) + Raw(first.Get(), parentSize - 2) + Raw("\0", 2) + Raw(a, sizeA) + Raw(b, mgr.GetSize(b)),
-              Block(CFSTR_SHELLIDLIST));
+    const std::string parent = Raw(first.Get(), parentSize - 2) + Raw("\0", 2);
+    EXPECT_EQ(Raw(header, 16) + parent + Raw(a, sizeA) + Raw(b, mgr.GetSize(b)), Block(CFSTR_SHELLIDLIST));
 }
 
 TEST_F(DataObjectTest, GetDataResultsWithoutADevice) {
