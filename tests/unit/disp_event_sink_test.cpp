@@ -1,30 +1,17 @@
 // Guards the dispatch event sink: wrong identity, a cookie kept or lost wrongly, events lost, wrongly refused or handed on in the wrong order or types.
-#include <windows.h>
-#include <ocidl.h>
-
 #include <gtest/gtest.h>
 
+#include <tuple>
 #include <vector>
 
-#include "CalvexDeviceMgrLib.h"
-#include "com/ComPtr.h"
-#include "com/DispEventSink.h"
 #include "SimDeviceManager.h"
-#include "support/DeviceSim.h"
-#include "support/TestSupport.h"
+#include "support/DeviceSim.h"  // the device manager's library, the sink, the contract walk
 
 using namespace testsupport;
 
 namespace {
-struct Call {
-    int handler;
-    std::vector<VARTYPE> types;
-    IDispatch* file;
-    LONG number;
-    bool operator==(const Call& o) const {
-        return handler == o.handler && types == o.types && file == o.file && number == o.number;
-    }
-};
+// One handler call: the handler, the types it was handed, the file and the number argument.
+using Call = std::tuple<int, std::vector<VARTYPE>, IDispatch*, LONG>;
 
 // Handlers reached through the sink map, recording the types they were handed.
 class FileEventsSink : public DispEventSinkImpl<FileEventsSink> {
@@ -32,20 +19,19 @@ public:
     FileEventsSink() : DispEventSinkImpl(DIID__IReceiverFileEvents, LIBID_CalvexDeviceMgrLib, 1, 0) {}
     static const SinkEntry* SinkMap() {
         static const SinkEntry map[] = {
-            {1, &FileEventsSink::OnBegin}, {2, &FileEventsSink::OnProgress}, {3, &FileEventsSink::OnFinish}, {0, nullptr}};
+            {1, &FileEventsSink::On<1>}, {2, &FileEventsSink::On<2>}, {3, &FileEventsSink::On<3>}, {0, nullptr}};
         return map;
     }
     std::vector<Call> calls;
 
 private:
-    void Record(int handler, const VARIANT* args, UINT count, LONG number) {
-        Call call{handler, {}, count ? args[0].pdispVal : nullptr, number};
-        for (UINT i = 0; i < count; ++i) call.types.push_back(args[i].vt);
-        calls.push_back(call);
+    template <int handler>
+    void On(const VARIANT* args, UINT count) {
+        std::vector<VARTYPE> types;
+        for (UINT i = 0; i < count; ++i) types.push_back(args[i].vt);
+        const LONG number = count < 2 ? 0 : args[1].vt == VT_UI1 ? args[1].bVal : args[1].lVal;
+        calls.emplace_back(handler, types, count ? args[0].pdispVal : nullptr, number);
     }
-    void OnBegin(const VARIANT* args, UINT count) { Record(1, args, count, 0); }
-    void OnProgress(const VARIANT* args, UINT count) { Record(2, args, count, args[1].bVal); }
-    void OnFinish(const VARIANT* args, UINT count) { Record(3, args, count, args[1].lVal); }
 };
 
 VARIANT Arg(VARTYPE type, LONG value, IDispatch* object = nullptr, const wchar_t* text = nullptr) {
@@ -93,11 +79,11 @@ TEST_F(DispEventSinkTest, CookieRuleAndADownloadsEvents) {
     EXPECT_EQ(E_FAIL, sink->Advise(file.Get())) << "already advised";
     EXPECT_EQ(cookie, sink->Cookie());
     ASSERT_EQ(S_OK, StartDownload(file.Get(), NewMemoryStream().Get()));
-    ASSERT_TRUE(PumpUntil([&] { return !sink->calls.empty() && sink->calls.back().handler == 3; }, 5000));
-    EXPECT_EQ(1, sink->calls.front().handler);
-    EXPECT_EQ((std::vector<VARTYPE>{VT_DISPATCH, VT_UI1}), sink->calls[1].types);
-    EXPECT_EQ(100, sink->calls[sink->calls.size() - 2].number);
-    EXPECT_EQ(S_OK, sink->calls.back().number);
+    ASSERT_TRUE(PumpUntil([&] { return !sink->calls.empty() && std::get<0>(sink->calls.back()) == 3; }, 5000));
+    EXPECT_EQ(1, std::get<0>(sink->calls.front()));
+    EXPECT_EQ((std::vector<VARTYPE>{VT_DISPATCH, VT_UI1}), std::get<1>(sink->calls[1]));
+    EXPECT_EQ(100, std::get<3>(sink->calls[sink->calls.size() - 2])) << "the last progress";
+    EXPECT_EQ(S_OK, std::get<3>(sink->calls.back()));
     EXPECT_EQ(S_OK, sink->Unadvise(file.Get()));
     EXPECT_EQ(0xFEFEFEFEu, sink->Cookie());
     const size_t heard = sink->calls.size();
@@ -113,12 +99,13 @@ TEST_F(DispEventSinkTest, InvokeCoercesToTheLibrarysTypesInDeclarationOrderOrRef
     IDispatch* file = sink.Get();  // any dispatch pointer stands for the file
     struct { DISPID dispid; std::vector<VARIANT> rgvarg; HRESULT hr; UINT argErr; std::vector<Call> calls; } cases[] = {
         // rgvarg: last argument first, as callers pass them
-        {1, {Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {{1, {VT_DISPATCH}, file, 0}}},
-        {2, {Arg(VT_I4, 50), Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {{2, {VT_DISPATCH, VT_UI1}, file, 50}}},
-        {2, {Arg(VT_BSTR, 0, nullptr, L"75"), Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {{2, {VT_DISPATCH, VT_UI1}, file, 75}}},
-        {3, {Arg(VT_I2, -5), Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {{3, {VT_DISPATCH, VT_I4}, file, -5}}},
+        {1, {Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {Call{1, {VT_DISPATCH}, file, 0}}},
+        {2, {Arg(VT_I4, 50), Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {Call{2, {VT_DISPATCH, VT_UI1}, file, 50}}},
+        {2, {Arg(VT_BSTR, 0, nullptr, L"75"), Arg(VT_DISPATCH, 0, file)}, S_OK, 99,
+         {Call{2, {VT_DISPATCH, VT_UI1}, file, 75}}},
+        {3, {Arg(VT_I2, -5), Arg(VT_DISPATCH, 0, file)}, S_OK, 99, {Call{3, {VT_DISPATCH, VT_I4}, file, -5}}},
         {3, {Arg(VT_I4, E_ABORT), Arg(VT_DISPATCH, 0, file)}, S_OK, 99,
-         {{3, {VT_DISPATCH, VT_I4}, file, static_cast<LONG>(E_ABORT)}}},
+         {Call{3, {VT_DISPATCH, VT_I4}, file, static_cast<LONG>(E_ABORT)}}},
         {2, {Arg(VT_DISPATCH, 0, file)}, DISP_E_BADPARAMCOUNT, 99, {}},
         // argErr: the index into rgvarg of the bad argument
         {2, {Arg(VT_BSTR, 0, nullptr, L"many"), Arg(VT_DISPATCH, 0, file)}, DISP_E_TYPEMISMATCH, 0, {}},
