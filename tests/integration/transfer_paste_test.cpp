@@ -6,28 +6,23 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <memory>
+#include <filesystem>
 #include <string>
-#include <utility>
 #include <vector>
 
-#include "com/ComPtr.h"
 #include "folder/IReceiversShellFolderImpl.h"
 #include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "support/DeviceSim.h"
-#include "support/TestSupport.h"
 #include "transfer/CCalvexReceiversDataObject.h"
 
 using namespace testsupport;
 
 namespace {
+using Texts = std::vector<std::wstring>;
+
 // Receivers by serial number (also their folder's name), their description lines and files.
-const struct {
-    const wchar_t* serial;
-    std::vector<std::wstring> lines;
-    std::vector<std::pair<const wchar_t*, size_t>> files;
-} kDevices[] = {
+const struct { const wchar_t* serial; Texts lines; std::vector<std::pair<const wchar_t*, size_t>> files; } kDevices[] = {
     {L"1000-0001", {L"[Times]", L"LOG0001=2026-11-03 07:58:12", L"BIG=2025-01-31 23:59:59"},
      {{L"EMPTY", 0}, {L"LOG0001", 5}, {L"BIG", 6u << 20}}},
     {L"1000-0002", {L"[Transfer]", L"Rate=40000"}, {{L"SLOW", 120000}}},
@@ -44,15 +39,10 @@ int Count(const std::string& text, const std::string& part) {
     return count;
 }
 
-// The directory's entries, sorted, dot entries left out.
-using Names = std::vector<std::wstring>;
-Names FilesIn(const std::wstring& dir) {
-    Names names;
-    WIN32_FIND_DATAW found;
-    HANDLE search = FindFirstFileW((dir + L"\\*").c_str(), &found);
-    for (bool more = search != INVALID_HANDLE_VALUE; more; more = FindNextFileW(search, &found))
-        if (found.cFileName[0] != L'.') names.push_back(found.cFileName);
-    if (search != INVALID_HANDLE_VALUE) FindClose(search);
+// The directory's entries, sorted.
+Texts FilesIn(const std::wstring& dir) {
+    Texts names;
+    for (const auto& entry : std::filesystem::directory_iterator(dir)) names.push_back(entry.path().filename());
     std::sort(names.begin(), names.end());
     return names;
 }
@@ -61,17 +51,12 @@ Names FilesIn(const std::wstring& dir) {
 struct DialogWatch {
     std::vector<int> positions;
     std::wstring lastText;
-    bool cancelOnProgress = false, pressedEnter = false, cancelled = false;
+    bool cancelOnProgress = false, pressedEnter = false;
 } g_watch;
 
 void CALLBACK WatchDialog(HWND, UINT, UINT_PTR, DWORD) {
-    HWND dialog = nullptr;
-    EnumThreadWindows(GetCurrentThreadId(), [](HWND window, LPARAM found) -> BOOL {
-        if (!GetDlgItem(window, 212) || !IsWindowVisible(window)) return TRUE;
-        *reinterpret_cast<HWND*>(found) = window;
-        return FALSE;
-    }, reinterpret_cast<LPARAM>(&dialog));
-    if (!dialog) return;
+    const HWND dialog = GetActiveWindow();  // the modal dialog, not its error box
+    if (!dialog || !GetDlgItem(dialog, 212)) return;
     const int position = static_cast<int>(SendDlgItemMessageW(dialog, 212, PBM_GETPOS, 0, 0));
     if (g_watch.positions.empty() || g_watch.positions.back() != position) {
         wchar_t text[256] = L"";
@@ -83,19 +68,17 @@ void CALLBACK WatchDialog(HWND, UINT, UINT_PTR, DWORD) {
         g_watch.pressedEnter = true;
         PostMessageW(dialog, WM_COMMAND, IDOK, 0);  // Enter must not close it
     }
-    if (g_watch.cancelOnProgress && position > 0 && !g_watch.cancelled) {
-        g_watch.cancelled = true;
+    if (g_watch.cancelOnProgress && position > 0) {
+        g_watch.cancelOnProgress = false;  // once
         PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
     }
 }
 
 class TransferPasteTest : public testing::Test {
 protected:
-    static void SetUpTestSuite() {
+    void SetUp() override {
         ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
         ASSERT_TRUE(SUCCEEDED(OleInitialize(nullptr)));  // the clipboard needs OLE on this thread
-    }
-    void SetUp() override {
         for (const auto& device : kDevices) {
             ReceiverSetup setup;
             setup.folder = setup.serialNumber = device.serial;
@@ -103,7 +86,6 @@ protected:
             tree.AddReceiver(setup);
             for (const auto& file : device.files) tree.AddFile(device.serial, file.first, file.second);
         }
-        scope.reset(new DeviceSimScope(tree.Root()));
         timer = SetTimer(nullptr, 0, 40, WatchDialog);
     }
     void TearDown() override {
@@ -148,7 +130,7 @@ protected:
     }
 
     ReceiverTree tree;
-    std::unique_ptr<DeviceSimScope> scope;
+    DeviceSimScope scope{tree.Root()};  // the tree is filled before the first client starts the server
     ComPtr<IShellFolder> root, receiver;
     ComPtr<IDataObject> data;
     UINT_PTR timer = 0;
@@ -160,7 +142,7 @@ TEST_F(TransferPasteTest, CopyPasteDeliversFilesByteIdenticalWithTheirTimes) {
     std::string output;
     EXPECT_EQ(0u, PasteThroughClipboard(target.Path(), output)) << output;
     EXPECT_EQ(0, Count(output, "message box:")) << output;
-    EXPECT_EQ((Names{L"BIG.qpr", L"EMPTY.qpr", L"LOG0001.qpr"}), FilesIn(target.Path())) << "nothing partial left";
+    EXPECT_EQ((Texts{L"BIG.qpr", L"EMPTY.qpr", L"LOG0001.qpr"}), FilesIn(target.Path())) << "nothing partial left";
     const struct { const wchar_t* name; size_t size; SYSTEMTIME time; } files[] = {{L"EMPTY", 0, {}},
         {L"LOG0001", 5, {2026, 11, 0, 3, 7, 58, 12, 0}}, {L"BIG", 6u << 20, {2025, 1, 0, 31, 23, 59, 59, 0}}};
     for (const auto& f : files) {
@@ -202,7 +184,7 @@ TEST_F(TransferPasteTest, OneFileOutcomes) {
         EXPECT_LT(GetTickCount() - started, c.withinMs) << "no hang; a cancel ends the download early";
         EXPECT_EQ(c.boxes, Count(output, "message box:")) << output;
         EXPECT_EQ(c.arrives ? 0 : 1, Count(output, "no contents (0x00000001)")) << "FileContents: S_FALSE\n" << output;
-        EXPECT_EQ(c.arrives ? Names{c.file} : Names{}, FilesIn(target.Path())) << "nothing partial left";
+        EXPECT_EQ(c.arrives ? Texts{c.file} : Texts{}, FilesIn(target.Path())) << "nothing partial left";
         EXPECT_TRUE(TraceContains(std::string("CProgressDialogMFC::") + c.dialogTrace));
         const std::vector<int>& seen = g_watch.positions;
         EXPECT_EQ(c.progress, !seen.empty() && seen.back() > 0);
