@@ -1,4 +1,4 @@
-// Guards live events: a tree change from the out-of-process simulator lost, notified under a wrong path, or not refreshing the view five seconds later.
+// Guards live events: a tree change from the out-of-process simulator lost, notified under a wrong path, or not refreshing the view five seconds later; sinks not unadvised at the end.
 #include <windows.h>
 #include <shlobj.h>
 
@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <map>
-#include <memory>
 #include <string>
 #include <vector>
 
@@ -27,90 +26,63 @@ std::map<HWND, int> g_viewMessages;
 void WINAPI RecordNotify(LONG, UINT, LPCVOID item1, LPCVOID) { g_notified.push_back(static_cast<const wchar_t*>(item1)); }
 
 LRESULT CALLBACK ViewProc(HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam) {
-    if (message == RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message")) {
-        ++g_viewMessages[hwnd];
-        return 0;
-    }
-    return DefWindowProcW(hwnd, message, wParam, lParam);
+    if (message != RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message"))
+        return DefWindowProcW(hwnd, message, wParam, lParam);
+    ++g_viewMessages[hwnd];
+    return 0;
 }
 
-HWND NewViewWindow() {
+// A stand-in for a view's window, registered with the folder as a view registers itself.
+HWND AddViewWindow(IShellFolder* folder) {
     WNDCLASSW windowClass = {};
     windowClass.lpfnWndProc = ViewProc;
     windowClass.hInstance = GetModuleHandleW(nullptr);
     windowClass.lpszClassName = L"TestEventsViewWindow";
     RegisterClassW(&windowClass);
-    return CreateWindowExW(0, windowClass.lpszClassName, L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr,
-                           windowClass.hInstance, nullptr);
-}
-
-IReceiversShellFolderImpl* Impl(IShellFolder* folder) {
-    return static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder));
+    HWND view = CreateWindowExW(0, windowClass.lpszClassName, L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr,
+                                windowClass.hInstance, nullptr);
+    static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder))->AddViewWindow(view);
+    return view;
 }
 
 // Waits for a line written after the trace had `from` bytes.
-bool WaitForTrace(const std::string& line, size_t from, DWORD timeout = 15000) {
-    return PumpUntil([&] { return ReadTraceLog().find(line, from) != std::string::npos; }, timeout);
+bool WaitForTrace(const std::string& line, size_t from) {
+    return PumpUntil([&] { return ReadTraceLog().find(line, from) != std::string::npos; }, 15000);
 }
-
-const wchar_t kRootPath[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
-
-class ShellFolderEventsTest : public testing::Test {
-protected:
-    static void SetUpTestSuite() { ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized()); }
-    void SetUp() override {
-        g_notified.clear();
-        g_viewMessages.clear();
-        CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
-        tree.AddReceiver({L"Calvex A"});  // 1000-0001, Q9 GNSS, on USB
-        tree.AddFile(L"Calvex A", L"LOG0001", 100);
-        scope.reset(new DeviceSimScope(tree.Root()));
-    }
-    void TearDown() override {
-        scope.reset();
-        CCalvexReceiversNotifyWindow::DestroyInstance();
-        CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
-    }
-    ReceiverTree tree;
-    std::unique_ptr<DeviceSimScope> scope;
-};
 }  // namespace
 
-TEST_F(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
-    ComPtr<IShellFolder> root;
-    ASSERT_EQ(S_OK, CreateCalvexReceiversShellFolder(nullptr, IID_IShellFolder, root.PutVoid()));
+TEST(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
+    ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
+    CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
+    ReceiverTree tree;
+    tree.AddReceiver({L"Calvex A"});  // 1000-0001, Q9 GNSS, on USB
+    tree.AddFile(L"Calvex A", L"LOG0001", 100);
+    DeviceSimScope scope(tree.Root());
+    ComPtr<IShellFolder> root, receiver;
     ComPtr<IPersistFolder> persist;
-    root.QueryTo(IID_IPersistFolder, persist.PutVoid());
+    ASSERT_EQ(S_OK, CreateCalvexReceiversShellFolder(nullptr, IID_IPersistFolder, persist.PutVoid()));
     ASSERT_EQ(S_OK, persist->Initialize(nullptr));
+    persist.QueryTo(IID_IShellFolder, root.PutVoid());
     persist.Reset();
     // Listed as Explorer lists them, which binds each folder to its collection.
     std::vector<TaskPidl> receivers = ListItems(root.Get(), SHCONTF_FOLDERS);
     ASSERT_EQ(1u, receivers.size());
-    ComPtr<IShellFolder> receiver;
     ASSERT_EQ(S_OK, root->BindToObject(receivers[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid()));
     EXPECT_EQ(1u, ListItems(receiver.Get(), SHCONTF_NONFOLDERS).size());
+    HWND rootView = AddViewWindow(root.Get()), receiverView = AddViewWindow(receiver.Get());
 
-    HWND rootView = NewViewWindow(), receiverView = NewViewWindow();
-    Impl(root.Get())->AddViewWindow(rootView);
-    Impl(receiver.Get())->AddViewWindow(receiverView);
-    const std::wstring receiverPath = std::wstring(kRootPath) + L"\\1000-0001!Q9 GNSS!USB";
-
-    struct Step {
-        const char* name;
-        void (*change)(ReceiverTree& tree);
-        const char* handlerLine;
-        std::wstring notifiedPath;
-        HWND view;
-    } steps[] = {
-        {"file added", [](ReceiverTree& t) { t.AddFile(L"Calvex A", L"LOG0002", 200); },
-         "CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n", receiverPath, receiverView},
-        {"file deleted", [](ReceiverTree& t) { t.RemoveFile(L"Calvex A", L"LOG0001"); },
-         "CCalvexFilesShellFolderEventHandler::OnFileDeleted\r\n", receiverPath, receiverView},
-        {"receiver plugged in", [](ReceiverTree& t) { t.AddReceiver({L"Calvex B", 1, L"B", L"1000-0002"}); },
-         "CCalvexReceiversShellFolderEventHandler::OnReceiverOnline\r\n", kRootPath, rootView},
+    const std::wstring rootPath = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
+    const std::wstring receiverPath = rootPath + L"\\1000-0001!Q9 GNSS!USB";
+    const struct { void (*change)(ReceiverTree& tree); const char* handlerLine; std::wstring notifiedPath; HWND view; } steps[] = {
+        {[](ReceiverTree& t) { t.AddFile(L"Calvex A", L"LOG0002", 200); }, "CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n",
+         receiverPath, receiverView},
+        {[](ReceiverTree& t) { t.RemoveFile(L"Calvex A", L"LOG0001"); }, "CCalvexFilesShellFolderEventHandler::OnFileDeleted\r\n",
+         receiverPath, receiverView},
+        {[](ReceiverTree& t) { t.AddReceiver({L"Calvex B", 1, L"B", L"1000-0002"}); },
+         "CCalvexReceiversShellFolderEventHandler::OnReceiverOnline\r\n", rootPath, rootView},
     };
-    for (Step& step : steps) {
-        SCOPED_TRACE(step.name);
+    for (const auto& step : steps) {
+        SCOPED_TRACE(step.handlerLine);
         g_notified.clear();
         g_viewMessages.clear();
         const size_t from = ReadTraceLog().size();
@@ -133,4 +105,6 @@ TEST_F(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
     EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::FinalRelease - unadvised from receivers collection\r\n"));
     DestroyWindow(rootView);
     DestroyWindow(receiverView);
+    CCalvexReceiversNotifyWindow::DestroyInstance();
+    CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
 }

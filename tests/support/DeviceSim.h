@@ -1,25 +1,23 @@
 #pragma once
-// Test helpers around the simulated device manager: temporary receiver trees, and the one
-// out-of-process simulator that every test program of the Wine prefix shares. A test that
-// points the simulator elsewhere (or sets faults in the registry) changes it for everyone:
-// its test program must run alone (a sibling <stem>.cmake with set(TEST_SERIAL SERIAL)).
+// Test helpers around the simulated device manager: temporary receiver trees, the one
+// out-of-process simulator that every test program of the Wine prefix shares, and a client's
+// walk through the contract. A test that points the simulator elsewhere (or sets faults in the
+// registry) changes it for everyone: its program must run alone (a sibling <stem>.cmake with
+// set(TEST_SERIAL SERIAL)).
 #include <windows.h>
 
-#include <functional>
 #include <string>
 #include <vector>
 
 #include "CalvexDeviceMgrLib.h"
-#include "com/DispEventSink.h"
 #include "com/ComPtr.h"
+#include "com/DispEventSink.h"
 #include "support/TestSupport.h"
 
 namespace testsupport {
 
-// The sample tree of the repository, the simulator's default.
-std::wstring SampleReceiversDir();
-
-// The fields of one receiver's description file.
+// The fields of one receiver's description file; extra lines are written as they stand
+// (L"[Transfer]", L"Rate=11520").
 struct ReceiverSetup {
     std::wstring folder;
     long brand = 1;
@@ -28,46 +26,39 @@ struct ReceiverSetup {
     std::wstring model = L"Q9 GNSS";
     long portType = 2;
     std::wstring portName;
-    // Further lines written as they stand, e.g. L"[Transfer]", L"Rate=11520".
     std::vector<std::wstring> extraLines;
 };
 
 // A receiver tree under %TEMP%, removed with its contents at the end.
 class ReceiverTree {
 public:
-    ReceiverTree();
+    ReceiverTree() : m_dir(L"receivers") {}
     const std::wstring& Root() const { return m_dir.Path(); }
     std::wstring FolderPath(const std::wstring& folder) const { return Root() + L"\\" + folder; }
-
-    // Makes the folder and writes its description file; returns the folder's path.
+    // Makes the folder and its description file (as given: UTF-8, maybe malformed); the folder's path.
     std::wstring AddReceiver(const ReceiverSetup& setup);
-    // Writes the description file as given (UTF-8), for malformed ones.
     void WriteDescription(const std::wstring& folder, const std::string& text);
-    // A file in a receiver's memory; returns its path.
+    // A file in a receiver's memory, of these bytes or of size bytes that differ from file to file.
     std::wstring AddFile(const std::wstring& folder, const std::wstring& name, const std::string& bytes);
-    // A file of size bytes that differ from file to file.
     std::wstring AddFile(const std::wstring& folder, const std::wstring& name, size_t size);
-    bool RemoveFile(const std::wstring& folder, const std::wstring& name);
-    bool RemoveReceiver(const std::wstring& folder);
+    bool RemoveFile(const std::wstring& folder, const std::wstring& name) {
+        return DeleteFileW((FolderPath(folder) + L"\\" + name).c_str()) != FALSE;
+    }
 
 private:
     TempDirectory m_dir;
 };
 
-bool FileExists(const std::wstring& path);
+inline bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
-// Makes every running CalvexDeviceSim.exe of the prefix quit ("CalvexDeviceSim.exe /Quit")
-// and waits until they are gone; this thread's messages are pumped meanwhile.
+// Makes every running CalvexDeviceSim.exe of the prefix quit ("/Quit") and waits until they
+// are gone; this thread's messages are pumped meanwhile.
 void StopDeviceSimServers();
-// Points the out-of-process simulator at root; the next client starts a fresh server.
-void UseDeviceSimRoot(const std::wstring& root);
-// Global faults of the simulator (DWORD values of its registry key, and call failures).
-void SetDeviceSimValue(const wchar_t* name, DWORD value);
+// A call's result for every receiver ("IReceiver.get_Label"), in the simulator's registry key.
 void SetDeviceSimCallFailure(const std::wstring& call, HRESULT result);
-// Back to the sample tree without faults; any running server is ended.
-void RestoreDeviceSimDefaults();
 
-// Scope of a test that owns the out-of-process simulator: defaults before and after.
+// Scope of a test that owns the out-of-process simulator: the sample tree (or root) without
+// faults, and no server left from before or after.
 class DeviceSimScope {
 public:
     explicit DeviceSimScope(const std::wstring& root = std::wstring());
@@ -76,88 +67,43 @@ public:
     DeviceSimScope& operator=(const DeviceSimScope&) = delete;
 };
 
-// Walking the contract through the interfaces' slots, as the extension does; a failed step
-// gives a null pointer (and its result where asked for).
-ComPtr<IDeviceMgr> CreateDeviceManager(HRESULT* result = nullptr);  // the local server
+// The contract walked through the interfaces' slots, as the extension does; a failed step
+// gives null (and its result where asked for).
+ComPtr<IDeviceMgr> CreateDeviceManager();  // the local server
 ComPtr<IReceiversColl> ReceiversOf(IDeviceMgr* manager);
 ComPtr<IReceiver> ReceiverAt(IReceiversColl* receivers, LONG index, HRESULT* result = nullptr);
 ComPtr<IReceiver> ReceiverByKey(IReceiversColl* receivers, const std::wstring& key, HRESULT* result = nullptr);
 ComPtr<IFilesColl> FilesOf(IReceiver* receiver);
 ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result = nullptr);
 ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result = nullptr);
-std::wstring FileName(IReceiverFile* file);
+// A file's name or a receiver's serial number; empty for anything else.
+std::wstring NameOf(IDispatch* object);
 
-// One row of a table of calls and the result each must give.
-struct CallCase {
-    const char* call;
-    std::function<HRESULT()> make;
-    HRESULT expected;
-};
-
-// Downloads into memory streams.
 ComPtr<IStream> NewMemoryStream();
 HRESULT StartDownload(IReceiverFile* file, IStream* stream);
-std::string StreamBytes(IStream* stream);  // the whole content, wherever the position is
-ULONGLONG StreamPosition(IStream* stream);
-// A failure by which a client learns that the server has gone.
-bool IsServerGone(HRESULT hr);
+// What the stream holds from its position on (a finished download has moved it to the start).
+std::string StreamBytes(IStream* stream);
 
-// A sink for any of the device manager's three event interfaces that records every call.
-// Subjects are kept, not read, inside the call: a handler never calls back into the server.
+// A sink for any of the device manager's three event interfaces that records every call
+// (advised and unadvised through DispEventSink). Subjects are kept, not read, inside the
+// call: a handler never calls back into the server.
 class SimEventRecorder : public DispEventSink {
 public:
-    struct Event {
-        DISPID id;
-        ComPtr<IDispatch> subject;
-        VARIANT second;  // VT_EMPTY when the event has one parameter
-    };
-
-    explicit SimEventRecorder(REFIID events) : DispEventSink(events, LIBID_CalvexDeviceMgrLib, 1, 0) {}
+    // value: the second argument (percent, result); 0 when there is none.
+    struct Event { DISPID id; ComPtr<IDispatch> subject; LONG value; };
     // A new recorder with one reference, owned by the caller.
-    static ComPtr<SimEventRecorder> Create(REFIID events) { return ComPtr<SimEventRecorder>(new SimEventRecorder(events)); }
+    static ComPtr<SimEventRecorder> Create(REFIID iid) { return ComPtr<SimEventRecorder>(new SimEventRecorder(iid)); }
 
-    HRESULT Advise(IUnknown* source);
-    HRESULT Unadvise();
-    const std::vector<Event>& Events() const { return m_received; }
-    size_t Count(DISPID id) const;
-    // Waits (pumping messages) until an event id has arrived; false after the timeout.
-    bool WaitFor(DISPID id, DWORD timeoutMilliseconds, size_t count = 1) const;
-    void Clear();
+    size_t Count(DISPID id) const { return Values(id).size(); }
+    std::vector<LONG> Values(DISPID id) const;  // of every event of this id, in order
+    // Pumps messages until an event of this id has arrived; false after the timeout.
+    bool WaitFor(DISPID id, DWORD timeout) const { return PumpUntil([&] { return Count(id) > 0; }, timeout); }
+
+    std::vector<Event> events;
 
 protected:
-    ~SimEventRecorder() override;
+    explicit SimEventRecorder(REFIID iid) : DispEventSink(iid, LIBID_CalvexDeviceMgrLib, 1, 0) {}
     void DispatchEvent(DISPID id, const VARIANT* args, UINT count) override;
-
-private:
-    ComPtr<IUnknown> m_source;
-    std::vector<Event> m_received;
 };
-
-// One download into a memory stream, started at construction, with its events recorded.
-class RecordedDownload {
-public:
-    explicit RecordedDownload(ComPtr<IReceiverFile> file);
-    ~RecordedDownload();
-    RecordedDownload(const RecordedDownload&) = delete;
-    RecordedDownload& operator=(const RecordedDownload&) = delete;
-
-    HRESULT Started() const { return m_started; }
-    // Pumps messages until OnFileFinish; false after the timeout.
-    bool WaitForFinish(DWORD timeoutMilliseconds = 15000) const;
-    HRESULT FinishResult() const;  // S_FALSE while there is none
-    std::vector<int> Percents() const;  // of the progress events, in order
-    IReceiverFile* File() const { return m_file.Get(); }
-    IStream* Stream() const { return m_stream.Get(); }
-    const SimEventRecorder& Events() const { return *m_events.Get(); }
-
-private:
-    ComPtr<IReceiverFile> m_file;
-    ComPtr<IStream> m_stream;
-    ComPtr<SimEventRecorder> m_events;
-    HRESULT m_started = E_FAIL;
-};
-
-// The name of what an event is about: a file's name or a receiver's serial number.
-std::wstring SubjectName(IDispatch* subject);
 
 }  // namespace testsupport

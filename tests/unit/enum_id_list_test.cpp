@@ -88,12 +88,16 @@ protected:
         }
         return items;
     }
-    std::vector<Item> Enumerate(const std::wstring& path, DWORD flags, IUnknown* coll, DWORD brand) {
+    // The items of a new enumerator, drained; Init must give `expected` (a failure destroys it).
+    std::vector<Item> Enumerate(const std::wstring& path, DWORD flags, IUnknown* coll, DWORD brand,
+                                HRESULT expected = S_OK, int failAfter = -1) {
         HRESULT hr = E_FAIL;
-        ComObject<CCalvexReceiversEnumIDList>* enumerator = Make(path.c_str(), flags, coll, brand, &hr);
-        std::vector<Item> items = enumerator ? Drain(enumerator) : std::vector<Item>{};
-        if (enumerator) enumerator->Release();
-        EXPECT_EQ(hr, S_OK);
+        std::vector<Item> items;
+        if (auto* enumerator = Make(path.c_str(), flags, coll, brand, &hr, failAfter)) {
+            items = Drain(enumerator);
+            enumerator->Release();
+        }
+        EXPECT_EQ(hr, expected);
         return items;
     }
 
@@ -107,18 +111,18 @@ protected:
 
 TEST_F(EnumIDListTest, ReceiversOfTheFolderBrandWithALabel) {
     const std::vector<ReceiverSetup> mixed = {Rx(L"A"), Rx(L"B", 2), Rx(L"C")};
+    auto Faulty = [](const wchar_t* fault) { return Rx(L"A", 1, {L"[Fail]", fault}); };
     ReceiverSetup unlabelled = Rx(L"A");
     unlabelled.label.clear();
     const struct { const char* what; std::vector<ReceiverSetup> receivers; DWORD brand; std::vector<Item> expected; } cases[] = {
         {"brand 1 of three", mixed, 1, {{3, L"A!M1!COM3"}, {3, L"C!M1!COM3"}}},
         {"brand 2 of three", mixed, 2, {{4, L"B!M1!COM3"}}},
-        {"brand S_FALSE", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Brand=1"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"brand fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Brand=0x80004005"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"brand S_FALSE", {Faulty(L"IReceiver.get_Brand=1"), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"brand fails", {Faulty(L"IReceiver.get_Brand=0x80004005"), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
         {"label empty", {unlabelled, Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"label S_FALSE", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Label=1"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"label fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiver.get_Label=0x80004005"}), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
-        {"get_Item fails", {Rx(L"A", 1, {L"[Fail]", L"IReceiversColl.get_Item=0x80004005"}), Rx(L"B")}, 1,
-         {{3, L"B!M1!COM3"}}},
+        {"label S_FALSE", {Faulty(L"IReceiver.get_Label=1"), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"label fails", {Faulty(L"IReceiver.get_Label=0x80004005"), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
+        {"get_Item fails", {Faulty(L"IReceiversColl.get_Item=0x80004005"), Rx(L"B")}, 1, {{3, L"B!M1!COM3"}}},
         {"model with slashes", {Rx(L"A", 1, {}, L"A/B/C")}, 1, {{3, L"A!A#B#C!COM3"}}},
         {"port USB", {Rx(L"A", 1, {}, L"M1", 2)}, 1, {{3, L"A!M1!USB"}}},
         {"port unknown", {Rx(L"A", 1, {}, L"M1", 7)}, 1, {{3, L"A!M1!Unknown"}}},
@@ -152,45 +156,32 @@ TEST_F(EnumIDListTest, FilesCarrySizeAndTimeInCollectionOrder) {
     EXPECT_EQ(items[2].time, 2.25);
 }
 
-TEST_F(EnumIDListTest, CollectionsAndFlagsThatListNothing) {
+TEST_F(EnumIDListTest, InitResultsAndWhatIsListed) {
     ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A")});
     ComPtr<IFilesColl> files = Files({{L"LOG1", 1}});
-    const struct { const char* what; const wchar_t* path; DWORD flags; IUnknown* coll; } cases[] = {
-        {"no collection", kRoot, kFolders | kFiles, nullptr},
-        {"receivers wanted of a files collection", kRoot, kFolders, files.Get()},
-        {"files wanted of a receivers collection", kRoot, kFiles, receivers.Get()},
-        {"neither flag", kRoot, SHCONTF_INCLUDEHIDDEN, receivers.Get()},
-        {"neither flag, path of separators", L"\\\\//", 0, receivers.Get()},
-    };
-    for (const auto& c : cases) { EXPECT_TRUE(Enumerate(c.path, c.flags, c.coll, 1).empty()) << c.what; }
-    // An empty folder path passes the component check through the default root name, but
-    // the items are made from the path as given: "\key" makes a root-kind item.
-    EXPECT_EQ(Enumerate(L"", kFolders, receivers.Get(), 1), (std::vector<Item>{{1, L"A!M1!COM3"}}));
-}
-
-TEST_F(EnumIDListTest, FailuresDestroyTheEnumerator) {
-    ComPtr<IReceiversColl> receivers = Receivers({Rx(L"A"), Rx(L"B")});
     const struct {
         const char* what;
         const wchar_t* path;
         DWORD flags;
+        IUnknown* coll;
         int allocations;  // successful allocations before the allocator fails (-1: none fails)
         HRESULT expected;
+        std::vector<Item> items;
     } cases[] = {
-        {"separators only, receivers", L"\\//\\", kFolders, -1, E_OUTOFMEMORY},
-        {"separators only, files", L"//", kFiles, -1, E_OUTOFMEMORY},
-        {"node allocation", kRoot, kFolders, 1, E_OUTOFMEMORY},
-        {"item allocation: skipped", kRoot, kFolders, 0, S_OK},
+        {"no collection", kRoot, kFolders | kFiles, nullptr, -1, S_OK, {}},
+        {"receivers wanted of a files collection", kRoot, kFolders, files.Get(), -1, S_OK, {}},
+        {"files wanted of a receivers collection", kRoot, kFiles, receivers.Get(), -1, S_OK, {}},
+        {"neither flag", kRoot, SHCONTF_INCLUDEHIDDEN, receivers.Get(), -1, S_OK, {}},
+        {"neither flag, path of separators", L"\\\\//", 0, receivers.Get(), -1, S_OK, {}},
+        // The default root name passes the component check, but items are made from the path
+        // as given: "\key" makes a root-kind item.
+        {"empty path", L"", kFolders, receivers.Get(), -1, S_OK, {{1, L"A!M1!COM3"}}},
+        {"separators only, receivers", L"\\//\\", kFolders, receivers.Get(), -1, E_OUTOFMEMORY, {}},
+        {"separators only, files", L"//", kFiles, receivers.Get(), -1, E_OUTOFMEMORY, {}},
+        {"node allocation", kRoot, kFolders, receivers.Get(), 1, E_OUTOFMEMORY, {}},
+        {"item allocation: skipped", kRoot, kFolders, receivers.Get(), 0, S_OK, {}},
     };
-    for (const auto& c : cases) {
-        HRESULT hr = E_FAIL;
-        if (auto* enumerator = Make(c.path, c.flags, receivers.Get(), 1, &hr, c.allocations)) {
-            EXPECT_TRUE(Drain(enumerator).empty()) << c.what;
-            enumerator->Release();
-        }
-        EXPECT_EQ(hr, c.expected) << c.what;
-        EXPECT_EQ(malloc.HeldReferences(), baseRefs) << c.what << ": the enumerator must be gone";
-    }
+    for (const auto& c : cases) EXPECT_EQ(Enumerate(c.path, c.flags, c.coll, 1, c.expected, c.allocations), c.items) << c.what;
 }
 
 TEST_F(EnumIDListTest, NextSkipResetClone) {

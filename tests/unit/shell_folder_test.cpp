@@ -1,4 +1,4 @@
-// Guards the folder's answers without a device manager: wrong parse, compare, name, attribute or identity results, operations not refused.
+// Guards the folder's answers without a device manager: wrong parse, compare, name, attribute, path or identity results, wrong item objects, operations not refused.
 #include <windows.h>
 #include <shlobj.h>
 
@@ -21,18 +21,14 @@ const wchar_t kCalvexRoot[] = L"::{E102076F-4057-4e7f-8209-511258F12B62}";
 // A folder as Explorer gets it (made, then Initialize), or a receiver folder below a root
 // as BindToObject makes it, but without binding to the device manager.
 template <class T>
-class TestFolder {
-public:
+struct TestFolder {
     explicit TestFolder(IReceiversShellFolderImpl* parent = nullptr, LPCITEMIDLIST pidl = nullptr) {
         EXPECT_EQ(S_OK, CreateComObject<T>(&object));
-        if (parent) { EXPECT_EQ(S_OK, object->Init(parent, pidl)); }
-        else EXPECT_EQ(S_OK, object->Initialize(nullptr));
+        EXPECT_EQ(S_OK, parent ? object->Init(parent, pidl) : object->Initialize(nullptr));
     }
     ~TestFolder() { object->Release(); }
     ComObject<T>* operator->() const { return object; }
     ComObject<T>* Get() const { return object; }
-
-private:
     ComObject<T>* object = nullptr;
 };
 
@@ -53,30 +49,33 @@ protected:
         return text;
     }
     CReceiversPidlMgr mgr;
+    UniquePidl receiverItem = Item(3, kKey), file = Item(6, L"FILE.qpr");
+    TestFolder<CCalvexReceiversShellFolder> root;
+    TestFolder<CBrennorReceiversShellFolder> brennor;
+    TestFolder<CCalvexReceiversShellFolder> receiver{root.Get(), receiverItem.Get()};
 };
 }  // namespace
 
 TEST_F(ShellFolderTest, GetAttributesOfReplacesTheMaskWithWhatAllItemsShare) {
-    UniquePidl receiver = Item(3, kKey), brennor = Item(4, kKey), file = Item(6, L"A.qpr"), root = Item(1, L"R");
+    UniquePidl brennorItem = Item(4, kKey), rootItem = Item(1, L"R");
     struct { std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
         {{}, 0xFFFFFFFF},
         {{file.Get()}, 0x02000001},
-        {{receiver.Get()}, 0x22000000},
-        {{brennor.Get(), receiver.Get()}, 0x22000000},
-        {{root.Get()}, 0xA2000000},
-        {{receiver.Get(), file.Get()}, 0x02000000},
-        {{root.Get(), file.Get()}, 0x02000000},
+        {{receiverItem.Get()}, 0x22000000},
+        {{brennorItem.Get(), receiverItem.Get()}, 0x22000000},
+        {{rootItem.Get()}, 0xA2000000},
+        {{receiverItem.Get(), file.Get()}, 0x02000000},
+        {{rootItem.Get(), file.Get()}, 0x02000000},
     };
-    TestFolder<CCalvexReceiversShellFolder> folder;
     for (const auto& c : cases) {
         SCOPED_TRACE(c.items.size());
         SFGAOF attributes = SFGAO_CANDELETE | SFGAO_CANMOVE;  // asked for, and ignored
-        EXPECT_EQ(S_OK, folder->GetAttributesOf(static_cast<UINT>(c.items.size()),
-                                                const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
+        EXPECT_EQ(S_OK, root->GetAttributesOf(static_cast<UINT>(c.items.size()),
+                                              const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
         EXPECT_EQ(c.expected, attributes);
     }
     LPCITEMIDLIST one[] = {file.Get()};
-    EXPECT_EQ(S_FALSE, folder->GetAttributesOf(1, one, nullptr));
+    EXPECT_EQ(S_FALSE, root->GetAttributesOf(1, one, nullptr));
     EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::GetAttributesOf - attributes is collected [33554432]\r\n"));
 }
 
@@ -84,7 +83,7 @@ TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
     UniquePidl big = Item(6, L"B.qpr", 10, 40000.5), small = Item(6, L"A.qpr", 3, 40000.5);
     UniquePidl later = Item(6, L"C.qpr", 3, 40001.0), huge = Item(6, L"H.qpr", 0x80000000u, 0);
     UniquePidl one = Item(6, L"O.qpr", 1, 0), receiverA = Item(3, L"ABC!m!p"), receiverB = Item(3, L"abd!m!p");
-    UniquePidl receiverA2 = Item(3, L"abc!M!P"), empty(mgr, mgr.Copy(nullptr));
+    UniquePidl receiverA2 = Item(3, L"abc!M!P");
     struct { LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
         {2, big.Get(), small.Get(), 14},                 // 7 * 2
         {-2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
@@ -101,24 +100,19 @@ TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
         {0, receiverA.Get(), receiverA2.Get(), 0},       // names ignore case
         {-1, receiverA.Get(), receiverA2.Get(), 0},
     };
-    TestFolder<CCalvexReceiversShellFolder> folder;
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
-        EXPECT_EQ(c.expected, folder->CompareIDs(c.lParam, c.first, c.second));
+        EXPECT_EQ(c.expected, root->CompareIDs(c.lParam, c.first, c.second));
     }
     // Names: the sign of _wcsicmp, multiplied out.
-    const HRESULT ascending = folder->CompareIDs(0, receiverA.Get(), receiverB.Get());
+    const HRESULT ascending = root->CompareIDs(0, receiverA.Get(), receiverB.Get());
     EXPECT_LT(ascending, 0);
-    EXPECT_EQ(-ascending, folder->CompareIDs(-1, receiverA.Get(), receiverB.Get()));
-    EXPECT_EQ(ascending * 4, folder->CompareIDs(4, receiverA.Get(), receiverB.Get()));
+    EXPECT_EQ(-ascending, root->CompareIDs(-1, receiverA.Get(), receiverB.Get()));
+    EXPECT_EQ(ascending * 4, root->CompareIDs(4, receiverA.Get(), receiverB.Get()));
     EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CompareIDs ID1=ABC!m!p, ID2=abd!m!p\r\n"));
 }
 
 TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
-    TestFolder<CCalvexReceiversShellFolder> root;
-    TestFolder<CBrennorReceiversShellFolder> brennor;
-    UniquePidl receiverItem = Item(3, kKey);
-    TestFolder<CCalvexReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
     struct { IShellFolder* folder; const wchar_t* name; HRESULT result; UINT count; DWORD type; const wchar_t* itemName; } cases[] = {
         {root.Get(), kKey, S_OK, 1, 3, kKey},
         {root.Get(), L"//123!Z#5!COM3\\", S_OK, 1, 3, kKey},
@@ -144,10 +138,6 @@ TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
 }
 
 TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
-    TestFolder<CCalvexReceiversShellFolder> root;
-    TestFolder<CBrennorReceiversShellFolder> brennor;
-    UniquePidl receiverItem = Item(3, kKey), file = Item(6, L"FILE.qpr");
-    TestFolder<CCalvexReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
     const std::wstring calvexParsing = std::wstring(kCalvexRoot) + L"\\" + kKey;
     struct { IShellFolder* folder; LPCITEMIDLIST item; SHGDNF flags; HRESULT result; std::wstring name; } cases[] = {
         {root.Get(), receiverItem.Get(), SHGDN_NORMAL, S_OK, L"Z/5@COM3"},
@@ -175,9 +165,7 @@ TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
 }
 
 TEST_F(ShellFolderTest, BothBrandsReportTheCalvexClass) {
-    TestFolder<CCalvexReceiversShellFolder> calvex;
-    TestFolder<CBrennorReceiversShellFolder> brennor;
-    for (IPersistFolder* folder : {static_cast<IPersistFolder*>(calvex.Get()), static_cast<IPersistFolder*>(brennor.Get())}) {
+    for (IPersistFolder* folder : {static_cast<IPersistFolder*>(root.Get()), static_cast<IPersistFolder*>(brennor.Get())}) {
         CLSID clsid = GUID_NULL;
         EXPECT_EQ(S_OK, folder->GetClassID(&clsid));
         EXPECT_TRUE(IsEqualCLSID(CLSID_CalvexReceiversShellFolder, clsid));
@@ -188,53 +176,50 @@ TEST_F(ShellFolderTest, BothBrandsReportTheCalvexClass) {
 }
 
 TEST_F(ShellFolderTest, RefusedOperations) {
-    TestFolder<CCalvexReceiversShellFolder> folder;
-    UniquePidl file = Item(6, L"FILE.qpr");
+    CCalvexReceiversShellFolder* folder = root.Get();
     LPCITEMIDLIST items[] = {file.Get(), file.Get()};
     void* object = reinterpret_cast<void*>(1);
-    struct { const char* name; HRESULT result; HRESULT expected; const char* trace; } cases[] = {
-        {"BindToObject of a file", folder->BindToObject(file.Get(), nullptr, IID_IShellFolder, &object), E_INVALIDARG, nullptr},
-        {"BindToStorage", folder->BindToStorage(file.Get(), nullptr, IID_IStream, &object), E_NOTIMPL,
-         "IReceiversShellFolderImpl::BindToStorage\r\n"},
-        {"SetNameOf", folder->SetNameOf(nullptr, file.Get(), L"x", 0, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl::SetNameOf - NOTIMPL\r\n"},
-        {"GetUIObjectOf of two", folder->GetUIObjectOf(nullptr, 2, items, IID_IContextMenu, nullptr, &object), E_FAIL, nullptr},
-        {"GetUIObjectOf other", folder->GetUIObjectOf(nullptr, 1, items, IID_IShellFolder, nullptr, &object), E_NOINTERFACE, nullptr},
-        {"CreateViewObject other", folder->CreateViewObject(nullptr, IID_IDropTarget, &object), E_NOINTERFACE, nullptr},
-        {"GetDefaultSearchGUID", folder->GetDefaultSearchGUID(nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::GetDefaultSearchGUID - NOTIMPL\r\n"},
-        {"EnumSearches", folder->EnumSearches(nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::EnumSearches - NOTIMPL\r\n"},
-        {"GetDefaultColumn", folder->GetDefaultColumn(0, nullptr, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::GetDefaultColumn - NOTIMPL\r\n"},
-        {"GetDefaultColumnState", folder->GetDefaultColumnState(0, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::GetDefaultColumnState - NOTIMPL\r\n"},
-        {"GetDetailsEx", folder->GetDetailsEx(nullptr, nullptr, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::GetDetailsEx - NOTIMPL\r\n"},
-        {"GetDetailsOf", folder->GetDetailsOf(nullptr, 0, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::GetDetailsOf - NOTMIPL\r\n"},
-        {"MapColumnToSCID", folder->MapColumnToSCID(0, nullptr), E_NOTIMPL,
-         "IReceiversShellFolderImpl2::MapColumnToSCID - NOTIMPL\r\n"},
+    struct { HRESULT result; HRESULT expected; const char* trace; } cases[] = {
+        {folder->BindToObject(file.Get(), nullptr, IID_IShellFolder, &object), E_INVALIDARG, nullptr},
+        {folder->BindToStorage(file.Get(), nullptr, IID_IStream, &object), E_NOTIMPL, "IReceiversShellFolderImpl::BindToStorage\r\n"},
+        {folder->SetNameOf(nullptr, file.Get(), L"x", 0, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl::SetNameOf - NOTIMPL\r\n"},
+        {folder->GetUIObjectOf(nullptr, 2, items, IID_IContextMenu, nullptr, &object), E_FAIL, nullptr},
+        {folder->GetUIObjectOf(nullptr, 1, items, IID_IShellFolder, nullptr, &object), E_NOINTERFACE, nullptr},
+        {folder->CreateViewObject(nullptr, IID_IDropTarget, &object), E_NOINTERFACE, nullptr},
+        {folder->GetDefaultSearchGUID(nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::GetDefaultSearchGUID - NOTIMPL\r\n"},
+        {folder->EnumSearches(nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::EnumSearches - NOTIMPL\r\n"},
+        {folder->GetDefaultColumn(0, nullptr, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::GetDefaultColumn - NOTIMPL\r\n"},
+        {folder->GetDefaultColumnState(0, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::GetDefaultColumnState - NOTIMPL\r\n"},
+        {folder->GetDetailsEx(nullptr, nullptr, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::GetDetailsEx - NOTIMPL\r\n"},
+        {folder->GetDetailsOf(nullptr, 0, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::GetDetailsOf - NOTMIPL\r\n"},
+        {folder->MapColumnToSCID(0, nullptr), E_NOTIMPL, "IReceiversShellFolderImpl2::MapColumnToSCID - NOTIMPL\r\n"},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.name);
+        SCOPED_TRACE(testing::Message() << "row " << &c - cases);
         EXPECT_EQ(c.expected, c.result);
         if (c.trace) { EXPECT_TRUE(testsupport::TraceContains(c.trace)); }
     }
     EXPECT_EQ(nullptr, object);
 }
 
-TEST_F(ShellFolderTest, ItemObjectsDescribeTheAbsoluteItem) {
-    TestFolder<CBrennorReceiversShellFolder> root;
-    UniquePidl receiverItem = Item(4, kKey), file = Item(6, L"FILE.qpr");
-    TestFolder<CBrennorReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
-    LPCITEMIDLIST items[] = {file.Get()};
+TEST_F(ShellFolderTest, ItemObjectsAndPathsDescribeTheAbsoluteItem) {
+    UniquePidl brennorItem = Item(4, kKey);
+    TestFolder<CBrennorReceiversShellFolder> brennorReceiver(brennor.Get(), brennorItem.Get());
+    const std::wstring full = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\" +
+                              std::wstring(kKey);
+    EXPECT_EQ(full, brennorReceiver->GetFullPath());
+    EXPECT_EQ(L"Calvex Receivers\\123!Z#5!COM3", brennorReceiver->FolderPath(false));
+    wchar_t small[20];
+    EXPECT_FALSE(brennorReceiver->GetFolderPath(small, 20, false)) << "16 + 1 + 12 characters do not fit in 20";
+    EXPECT_STREQ(L"", small);
 
+    LPCITEMIDLIST items[] = {file.Get()};
     ComPtr<IExtractIconW> icon;
     ComPtr<IQueryInfo> info;
     ComPtr<IContextMenu> menu;
-    ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IExtractIconW, nullptr, icon.PutVoid()));
-    ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IQueryInfo, nullptr, info.PutVoid()));
-    EXPECT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, items, IID_IContextMenu, nullptr, menu.PutVoid()));
+    ASSERT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IExtractIconW, nullptr, icon.PutVoid()));
+    ASSERT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IQueryInfo, nullptr, info.PutVoid()));
+    EXPECT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IContextMenu, nullptr, menu.PutVoid()));
     int index = -1;
     UINT flags = 0;
     EXPECT_EQ(S_OK, icon->GetIconLocation(0, nullptr, 0, &index, &flags));
@@ -248,19 +233,4 @@ TEST_F(ShellFolderTest, ItemObjectsDescribeTheAbsoluteItem) {
     CoTaskMemFree(tip);
     DWORD infoFlags = 0;
     EXPECT_EQ(E_NOTIMPL, info->GetInfoFlags(&infoFlags));
-}
-
-TEST_F(ShellFolderTest, InitTracesTheFullParsingPath) {
-    TestFolder<CBrennorReceiversShellFolder> root;
-    UniquePidl receiverItem = Item(4, kKey);
-    TestFolder<CBrennorReceiversShellFolder> receiver(root.Get(), receiverItem.Get());
-    const std::wstring full = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\" +
-                              std::wstring(kKey);
-    EXPECT_EQ(full, receiver->GetFullPath());
-    EXPECT_EQ(L"Calvex Receivers\\123!Z#5!COM3", receiver->FolderPath(false));
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::Init " + testsupport::Narrow(full) + "\r\n"));
-
-    wchar_t small[20];
-    EXPECT_FALSE(receiver->GetFolderPath(small, 20, false)) << "16 + 1 + 12 characters do not fit in 20";
-    EXPECT_STREQ(L"", small);
 }
