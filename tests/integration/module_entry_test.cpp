@@ -1,4 +1,4 @@
-// Guards the DLL's exports: wrong class objects or lock counts, load and unload trace lines, settings not written at unload.
+// Guards the DLL's exports: wrong class objects or lock counts, load and unload trace lines, column widths misread at load or not written at unload.
 #include <windows.h>
 #include <shlobj.h>
 
@@ -16,7 +16,6 @@
 using namespace testsupport;
 
 namespace {
-
 ComPtr<IClassFactory> Factory(LoadedModule& module, const CLSID& clsid) {
     ComPtr<IClassFactory> factory;
     EXPECT_EQ(S_OK, module.getClassObject(clsid, IID_IClassFactory, factory.PutVoid()));
@@ -26,20 +25,15 @@ ComPtr<IClassFactory> Factory(LoadedModule& module, const CLSID& clsid) {
 const CLSID* const kTableClasses[] = {
     &CLSID_CalvexReceiversShellFolder, &CLSID_CalvexReceiversShellView, &CLSID_CalvexReceiversEnumIDList,
     &CLSID_CalvexReceiversExtractIcon, &CLSID_CalvexReceiversContextMenu, &CLSID_CalvexReceiversDataObject,
-    &CLSID_CalvexReceiversQueryInfo, &CLSID_BrennorReceiversShellFolder,
-};
+    &CLSID_CalvexReceiversQueryInfo, &CLSID_BrennorReceiversShellFolder};
 }  // namespace
 
 TEST(ModuleEntry, ClassObjectsAreCachedAndCreatePlainAndAggregatedObjects) {
     LoadedModule module;
     ASSERT_TRUE(module.Loaded());
     static const CLSID kForeign = {0x12345678, 0x1234, 0x1234, {1, 2, 3, 4, 5, 6, 7, 8}};
-    const struct {
-        const CLSID& clsid;
-        REFIID iid;
-        HRESULT expected;
-    } refused[] = {{kForeign, IID_IClassFactory, CLASS_E_CLASSNOTAVAILABLE},
-                   {CLSID_CalvexReceiversShellFolder, IID_IDataObject, E_NOINTERFACE}};
+    const struct { const CLSID& clsid; REFIID iid; HRESULT expected; } refused[] = {
+        {kForeign, IID_IClassFactory, CLASS_E_CLASSNOTAVAILABLE}, {CLSID_CalvexReceiversShellFolder, IID_IDataObject, E_NOINTERFACE}};
     for (const auto& r : refused) {
         void* object = reinterpret_cast<void*>(0x1);
         EXPECT_EQ(r.expected, module.getClassObject(r.clsid, r.iid, &object));
@@ -59,8 +53,7 @@ TEST(ModuleEntry, ClassObjectsAreCachedAndCreatePlainAndAggregatedObjects) {
         EXPECT_EQ(nullptr, inner);
         IUnknown* aggregated = nullptr;
         EXPECT_EQ(S_OK, factory->CreateInstance(plain.Get(), IID_IUnknown, reinterpret_cast<void**>(&aggregated)));
-        ASSERT_NE(nullptr, aggregated);
-        EXPECT_EQ(0u, aggregated->Release());
+        EXPECT_EQ(0u, aggregated ? aggregated->Release() : 1u);
     }
 }
 
@@ -85,30 +78,34 @@ TEST(ModuleEntry, CanUnloadOnlyWhenNothingIsAlive) {
     EXPECT_EQ(S_OK, module.canUnloadNow());
 }
 
-// Each load starts the trace file anew (hidden) with its identity; the unload ends it and
-// stores the column widths as 12 bytes.
-TEST(ModuleEntry, EachLoadRecreatesTheTraceAndUnloadSavesSettings) {
-    for (int load = 0; load < 2; ++load) {
-        SCOPED_TRACE(load);
+// Each load starts the trace file anew (hidden) with its identity; the unload ends it and stores
+// as 12 little-endian bytes the column widths read at load: those of a stored value of 8 to 16
+// bytes, else 100 each.
+TEST(ModuleEntry, EachLoadRecreatesTheTraceAndUnloadSavesTheWidthsItRead) {
+    const DWORD stored[5] = {0x141, 45, 7, 9, 11};
+    const struct { DWORD size; BYTE name0, name1, second; } cases[] = {
+        {0, 100, 0, 100}, {8, 0x41, 1, 45}, {12, 0x41, 1, 45}, {16, 0x41, 1, 45}, {20, 100, 0, 100}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.size);
         RegDeleteKeyW(HKEY_CURRENT_USER, kSettingsKey);
+        if (c.size) { ASSERT_EQ(0, RegSetKeyValueW(HKEY_CURRENT_USER, kSettingsKey, kDisplaySettingsValue, REG_BINARY, stored, c.size)); }
         LoadedModule module;
         ASSERT_TRUE(module.Loaded());
         EXPECT_EQ(S_OK, module.canUnloadNow());  // does not load the module's state
-        ASSERT_TRUE(Factory(module, load ? CLSID_BrennorReceiversShellFolder : CLSID_CalvexReceiversShellFolder));
+        ASSERT_TRUE(Factory(module, c.size % 8 ? CLSID_BrennorReceiversShellFolder : CLSID_CalvexReceiversShellFolder));
         module.Unload();
-        const std::vector<std::string> expected = {
-            "CModuleApp::InitInstance\r\n",
-            "Module is loaded [" + Narrow(ModuleDllPath()) + "] [1.0.0.1]\r\n", "CModuleApp::ExitInstance\r\n"};
-        EXPECT_EQ(expected, TraceMessages()) << "nothing left of the earlier load";
+        EXPECT_EQ(std::vector<std::string>({"CModuleApp::InitInstance\r\n", "Module is loaded [" + Narrow(ModuleDllPath()) +
+                                            "] [1.0.0.1]\r\n", "CModuleApp::ExitInstance\r\n"}),
+                  TraceMessages()) << "nothing left of the earlier load";
         BYTE value[32];
         DWORD size = sizeof value, type = 0;
         ASSERT_EQ(ERROR_SUCCESS,
                   RegGetValueW(HKEY_CURRENT_USER, kSettingsKey, kDisplaySettingsValue, RRF_RT_ANY, &type, value, &size));
-        EXPECT_EQ(static_cast<DWORD>(REG_BINARY), type);
-        const DWORD widths[3] = {100, 100, 0};
-        ASSERT_EQ(sizeof widths, size);
-        EXPECT_EQ(0, memcmp(widths, value, sizeof widths));
+        const BYTE widths[12] = {c.name0, c.name1, 0, 0, c.second, 0, 0, 0, 0, 0, 0, 0};
+        EXPECT_EQ(std::make_pair(DWORD(REG_BINARY), std::string(reinterpret_cast<const char*>(widths), 12)),
+                  std::make_pair(type, std::string(reinterpret_cast<const char*>(value), size)));
     }
+    RegDeleteKeyW(HKEY_CURRENT_USER, kSettingsKey);  // other tests in this prefix start from the defaults
     const DWORD attributes = GetFileAttributesW(TraceLogPath().c_str());
     ASSERT_NE(INVALID_FILE_ATTRIBUTES, attributes);
     EXPECT_TRUE(attributes & FILE_ATTRIBUTE_HIDDEN);

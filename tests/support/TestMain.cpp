@@ -13,10 +13,9 @@
 static void UsePrivateTempDirectory() {
     wchar_t base[MAX_PATH] = L"";
     GetTempPathW(MAX_PATH, base);
-    std::wstring dir = std::wstring(base) + L"calvex-test-" + std::to_wstring(GetCurrentProcessId());
+    const std::wstring dir = std::wstring(base) + L"calvex-test-" + std::to_wstring(GetCurrentProcessId());
     CreateDirectoryW(dir.c_str(), nullptr);
-    SetEnvironmentVariableW(L"TMP", dir.c_str());
-    SetEnvironmentVariableW(L"TEMP", dir.c_str());
+    for (const wchar_t* name : {L"TMP", L"TEMP"}) SetEnvironmentVariableW(name, dir.c_str());
 }
 
 // A fault in a test program is reported and ends it at once, instead of waiting for a

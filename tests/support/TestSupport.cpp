@@ -21,9 +21,7 @@ std::wstring BuildDir() { return DirFromEnvironment("CALVEX_BUILD_DIR"); }
 std::wstring SourceDir() { return DirFromEnvironment("CALVEX_SOURCE_DIR"); }
 std::wstring ModuleDllPath() { return BuildDir() + L"\\CalvexReceiversShellExt.dll"; }
 
-void PumpMessagesFor(DWORD milliseconds) {
-    PumpUntil([] { return false; }, milliseconds);
-}
+void PumpMessagesFor(DWORD milliseconds) { PumpUntil([] { return false; }, milliseconds); }
 
 bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds) {
     const ULONGLONG end = GetTickCount64() + timeoutMilliseconds;
@@ -34,10 +32,9 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds) {
             DispatchMessageW(&msg);
         }
         if (done()) return true;
-        ULONGLONG now = GetTickCount64();
+        const ULONGLONG now = GetTickCount64();
         if (now >= end) return false;
-        MsgWaitForMultipleObjects(0, nullptr, FALSE, static_cast<DWORD>(std::min<ULONGLONG>(end - now, 20)),
-                                  QS_ALLINPUT);
+        MsgWaitForMultipleObjects(0, nullptr, FALSE, static_cast<DWORD>(std::min<ULONGLONG>(end - now, 20)), QS_ALLINPUT);
     }
 }
 
@@ -46,20 +43,20 @@ DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds) {
     PROCESS_INFORMATION process = {};
     if (!CreateProcessW(nullptr, &commandLine[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
         return GetLastError();
-    CloseHandle(process.hThread);
-    const bool ended = PumpUntil([&] { return WaitForSingleObject(process.hProcess, 0) == WAIT_OBJECT_0; },
-                                 timeoutMilliseconds);
+    UniqueHandle thread(process.hThread), owned(process.hProcess);
     DWORD exitCode = WAIT_TIMEOUT;
-    if (ended) GetExitCodeProcess(process.hProcess, &exitCode);
-    CloseHandle(process.hProcess);
+    if (PumpUntil([&] { return WaitForSingleObject(process.hProcess, 0) == WAIT_OBJECT_0; }, timeoutMilliseconds))
+        GetExitCodeProcess(process.hProcess, &exitCode);
     return exitCode;
 }
 
-std::wstring TraceLogPath() {
+static std::wstring TempPath() {
     wchar_t dir[MAX_PATH] = L"";
     GetTempPathW(MAX_PATH, dir);
-    return std::wstring(dir) + L"CalvexReceiversShellExt.log";
+    return dir;
 }
+
+std::wstring TraceLogPath() { return TempPath() + L"CalvexReceiversShellExt.log"; }
 
 std::string ReadFileBytes(const std::wstring& path) {
     UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
@@ -76,14 +73,10 @@ std::string ReadTraceLog() { return ReadFileBytes(TraceLogPath()); }
 std::vector<std::string> TraceMessages() {
     std::vector<std::string> messages;
     const std::string log = ReadTraceLog();
-    size_t start = 0;
-    while (start < log.size()) {
-        size_t end = log.find('\n', start);
-        std::string line = log.substr(start, end == std::string::npos ? std::string::npos : end + 1 - start);
-        size_t tab = line.find('\t');
-        messages.push_back(tab == std::string::npos ? line : line.substr(tab + 1));
-        if (end == std::string::npos) break;
-        start = end + 1;
+    for (size_t start = 0, end; start < log.size(); start = end) {
+        end = std::min(log.find('\n', start), log.size() - 1) + 1;
+        const size_t tab = log.find('\t', start);
+        messages.push_back(log.substr(tab < end ? tab + 1 : start, end - (tab < end ? tab + 1 : start)));
     }
     return messages;
 }
@@ -104,24 +97,19 @@ std::vector<TaskPidl> ListItems(IShellFolder* folder, SHCONTF flags, HRESULT* re
 }
 
 std::string Narrow(const std::wstring& text) {
-    int n = WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), nullptr, 0, nullptr, nullptr);
-    std::string out(static_cast<size_t>(n), '\0');
-    WideCharToMultiByte(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), &out[0], n, nullptr, nullptr);
+    std::string out(WideCharToMultiByte(CP_UTF8, 0, text.data(), int(text.size()), nullptr, 0, nullptr, nullptr), '\0');
+    WideCharToMultiByte(CP_UTF8, 0, text.data(), int(text.size()), &out[0], int(out.size()), nullptr, nullptr);
     return out;
 }
 
 std::wstring Wide(const std::string& text) {
-    int n = MultiByteToWideChar(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), nullptr, 0);
-    std::wstring out(static_cast<size_t>(n), L'\0');
-    MultiByteToWideChar(CP_UTF8, 0, text.data(), static_cast<int>(text.size()), &out[0], n);
+    std::wstring out(MultiByteToWideChar(CP_UTF8, 0, text.data(), int(text.size()), nullptr, 0), L'\0');
+    MultiByteToWideChar(CP_UTF8, 0, text.data(), int(text.size()), &out[0], int(out.size()));
     return out;
 }
 
-TempDirectory::TempDirectory(const std::wstring& name) {
-    wchar_t dir[MAX_PATH] = L"";
-    GetTempPathW(MAX_PATH, dir);
-    m_path = std::wstring(dir) + name + L"-" + std::to_wstring(GetCurrentProcessId()) + L"-" +
-             std::to_wstring(GetTickCount64());
+TempDirectory::TempDirectory(const std::wstring& name)
+    : m_path(TempPath() + name + L"-" + std::to_wstring(GetCurrentProcessId()) + L"-" + std::to_wstring(GetTickCount64())) {
     CreateDirectoryW(m_path.c_str(), nullptr);
 }
 

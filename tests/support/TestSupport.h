@@ -28,25 +28,20 @@ DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000);
 std::string ReadFileBytes(const std::wstring& path);
 
 std::wstring TraceLogPath();
-// The whole trace file as bytes (readable while the module holds it open).
-std::string ReadTraceLog();
+std::string ReadTraceLog();  // the whole file, also while the module holds it
 // The trace's messages without their time prefixes, split at "\n".
 std::vector<std::string> TraceMessages();
 bool TraceContains(const std::string& message);
 
 // Item identifier lists owned as the shell hands them out.
-struct TaskMemFree {
-    void operator()(void* block) const { CoTaskMemFree(block); }
-};
+struct TaskMemFree { void operator()(void* block) const { CoTaskMemFree(block); } };
 using TaskPidl = std::unique_ptr<ITEMIDLIST, TaskMemFree>;
 // The folder's items; EnumObjects' result where asked for.
 std::vector<TaskPidl> ListItems(IShellFolder* folder, SHCONTF flags, HRESULT* result = nullptr);
 
-std::string Narrow(const std::wstring& text);
+std::string Narrow(const std::wstring& text);  // UTF-8
 std::wstring Wide(const std::string& text);
-
-// Removes a directory with its contents.
-bool DeleteTree(const std::wstring& path);
+bool DeleteTree(const std::wstring& path);  // a directory with its contents
 
 // A fresh empty directory under %TEMP%, removed with its contents on destruction.
 class TempDirectory {

@@ -4,69 +4,52 @@
 
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <string>
+#include <thread>
 
 #include "com/ComPtr.h"
 #include "module/ClassCreators.h"
-#include "support/TestSupport.h"
 
 namespace {
-ComPtr<IContextMenu> NewMenu() {
+class ContextMenuTest : public testing::Test {
+protected:
+    void SetUp() override { ASSERT_EQ(S_OK, CreateCalvexReceiversContextMenu(nullptr, IID_IContextMenu, menu.PutVoid())); }
     ComPtr<IContextMenu> menu;
-    EXPECT_EQ(S_OK, CreateCalvexReceiversContextMenu(nullptr, IID_IContextMenu, menu.PutVoid()));
-    return menu;
-}
-
-struct Box {
-    std::wstring caption;
-    std::wstring text;
-    bool owned = false;
 };
 
-// Watches for the information box, reads it and presses OK.
-DWORD WINAPI CloseBox(void* param) {
-    auto* box = static_cast<Box*>(param);
-    for (int i = 0; i < 500; ++i) {
+// Waits for the information box, reads its text and whether it has an owner, and presses OK.
+void CloseBox(std::wstring& text, bool& owned) {
+    for (int i = 0; i < 500; ++i, Sleep(20)) {
         HWND dialog = FindWindowW(L"#32770", L"Sample Explorer Bar");
-        if (dialog) {
-            box->caption = L"Sample Explorer Bar";
-            wchar_t text[256] = L"";
-            GetDlgItemTextW(dialog, 0xFFFF, text, 256);  // the message box's static text
-            box->text = text;
-            box->owned = GetWindow(dialog, GW_OWNER) != nullptr;
-            PostMessageW(dialog, WM_COMMAND, IDOK, 0);
-            return 0;
-        }
-        Sleep(20);
+        if (!dialog) continue;
+        wchar_t buffer[256] = L"";
+        GetDlgItemTextW(dialog, 0xFFFF, buffer, 256);  // the message box's static text
+        text = buffer;
+        owned = GetWindow(dialog, GW_OWNER) != nullptr;
+        PostMessageW(dialog, WM_COMMAND, IDOK, 0);
+        return;
     }
-    return 1;
 }
 }  // namespace
 
-TEST(ContextMenu, QueryContextMenuAddsOneItemUnlessDefaultOnly) {
-    struct { UINT flags; HRESULT result; int items; } cases[] = {
-        {CMF_DEFAULTONLY, 0, 0}, {CMF_DEFAULTONLY | CMF_EXPLORE, 0, 0}, {CMF_NORMAL, 1, 1}, {CMF_EXPLORE, 1, 1},
-        {CMF_CANRENAME | CMF_VERBSONLY, 1, 1},
-    };
-    ComPtr<IContextMenu> menu = NewMenu();
-    ASSERT_TRUE(menu);
+TEST_F(ContextMenuTest, QueryContextMenuAddsOneItemUnlessDefaultOnly) {
+    struct { UINT flags; int items; } cases[] = {  // the result is the count of ids used
+        {CMF_DEFAULTONLY, 0}, {CMF_DEFAULTONLY | CMF_EXPLORE, 0}, {CMF_NORMAL, 1}, {CMF_EXPLORE, 1}, {CMF_CANRENAME | CMF_VERBSONLY, 1}};
     for (const auto& c : cases) {
         SCOPED_TRACE(c.flags);
         HMENU popup = CreatePopupMenu();
         AppendMenuW(popup, MF_STRING, 1, L"existing");
-        EXPECT_EQ(c.result, menu->QueryContextMenu(popup, 0, 40, 41, c.flags));
-        EXPECT_EQ(1 + c.items, GetMenuItemCount(popup));
-        if (c.items) {
-            wchar_t text[64] = L"";
-            GetMenuStringW(popup, 0, text, 64, MF_BYPOSITION);
-            EXPECT_STREQ(L"&Sample Explorer Bar Command", text);
-            EXPECT_EQ(40u, GetMenuItemID(popup, 0)) << "inserted at the position, with the first id";
-        }
+        EXPECT_EQ(MAKE_HRESULT(0, 0, c.items), menu->QueryContextMenu(popup, 0, 40, 41, c.flags));
+        wchar_t text[64] = L"";
+        GetMenuStringW(popup, 0, text, 64, MF_BYPOSITION);
+        EXPECT_EQ(c.items ? L"&Sample Explorer Bar Command|40|2" : L"existing|1|1",  // inserted at the position, with the first id
+                  std::wstring(text) + L"|" + std::to_wstring(GetMenuItemID(popup, 0)) + L"|" + std::to_wstring(GetMenuItemCount(popup)));
         DestroyMenu(popup);
     }
 }
 
-TEST(ContextMenu, GetCommandStringWritesNarrowBytesWithinTheSize) {
+TEST_F(ContextMenuTest, GetCommandStringWritesNarrowBytesWithinTheSize) {
     struct { UINT type; UINT_PTR offset; UINT size; HRESULT result; const char* text; } cases[] = {  // text null: untouched
         {GCS_VERBW, 0, 64, S_OK, "command"},
         {GCS_HELPTEXTW, 0, 64, S_OK, "Explorer Bar command help text"},
@@ -76,8 +59,6 @@ TEST(ContextMenu, GetCommandStringWritesNarrowBytesWithinTheSize) {
         {GCS_VERBA, 0, 64, E_INVALIDARG, nullptr},      {GCS_HELPTEXTA, 0, 64, E_INVALIDARG, nullptr},
         {GCS_VALIDATEA, 0, 64, E_INVALIDARG, nullptr},
     };
-    ComPtr<IContextMenu> menu = NewMenu();
-    ASSERT_TRUE(menu);
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "type " << c.type << " offset " << c.offset << " size " << c.size);
         char buffer[128];
@@ -89,9 +70,7 @@ TEST(ContextMenu, GetCommandStringWritesNarrowBytesWithinTheSize) {
     }
 }
 
-TEST(ContextMenu, InvokeCommandRefusesVerbsAndShowsTheBoxForOffsetZero) {
-    ComPtr<IContextMenu> menu = NewMenu();
-    ASSERT_TRUE(menu);
+TEST_F(ContextMenuTest, InvokeCommandRefusesVerbsAndShowsTheBoxForOffsetZero) {
     HWND owner = CreateWindowExW(0, L"STATIC", L"owner", WS_OVERLAPPED, 0, 0, 100, 100, nullptr, nullptr, nullptr, nullptr);
     for (LPCSTR verb : {static_cast<LPCSTR>("command"), static_cast<LPCSTR>(MAKEINTRESOURCEA(1))}) {
         CMINVOKECOMMANDINFO info = {sizeof info, 0, owner, verb};
@@ -99,14 +78,13 @@ TEST(ContextMenu, InvokeCommandRefusesVerbsAndShowsTheBoxForOffsetZero) {
     }
     EXPECT_EQ(nullptr, FindWindowW(L"#32770", L"Sample Explorer Bar"));
 
-    Box box;
-    HANDLE closer = CreateThread(nullptr, 0, CloseBox, &box, 0, nullptr);
+    std::wstring text;
+    bool owned = false;
+    std::thread closer(CloseBox, std::ref(text), std::ref(owned));
     CMINVOKECOMMANDINFO info = {sizeof info, 0, owner, MAKEINTRESOURCEA(0)};
     EXPECT_EQ(S_OK, menu->InvokeCommand(&info));
-    EXPECT_EQ(WAIT_OBJECT_0, WaitForSingleObject(closer, 15000));
-    CloseHandle(closer);
-    EXPECT_EQ(L"Sample Explorer Bar", box.caption);
-    EXPECT_EQ(L"Explorer Bar Command selected.", box.text);
-    EXPECT_TRUE(box.owned);
+    closer.join();
+    EXPECT_EQ(L"Explorer Bar Command selected.", text) << "a box titled \"Sample Explorer Bar\"";
+    EXPECT_TRUE(owned);
     DestroyWindow(owner);
 }

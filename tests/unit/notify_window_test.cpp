@@ -16,53 +16,36 @@
 #include "support/TestSupport.h"
 
 namespace {
-struct Notification {
-    LONG eventId;
-    UINT flags;
-    std::wstring path;
-    bool secondItemNull;
-    ULONGLONG tick;
-};
+struct Notification { std::wstring call; ULONGLONG tick; };  // call: "event flags path has-second-item"
 std::vector<Notification> g_notifications;
 void (*g_duringNotify)() = nullptr;
 
 void WINAPI RecordNotify(LONG eventId, UINT flags, LPCVOID item1, LPCVOID item2) {
-    g_notifications.push_back({eventId, flags, static_cast<const wchar_t*>(item1), item2 == nullptr, GetTickCount64()});
-    if (auto during = g_duringNotify) {
-        g_duringNotify = nullptr;
-        during();
-    }
+    wchar_t call[1024];
+    swprintf(call, 1024, L"%lX %X %ls %d", eventId, flags, static_cast<const wchar_t*>(item1), item2 != nullptr);
+    g_notifications.push_back({call, GetTickCount64()});
+    if (auto during = g_duringNotify) g_duringNotify = nullptr, during();
 }
 
 LPARAM PathBlock(const std::wstring& path) {
-    const size_t bytes = (path.size() + 1) * sizeof(wchar_t);
-    HGLOBAL block = GlobalAlloc(GHND, bytes);
-    memcpy(GlobalLock(block), path.c_str(), bytes);
+    HGLOBAL block = GlobalAlloc(GHND, (path.size() + 1) * sizeof(wchar_t));
+    wcscpy(static_cast<wchar_t*>(GlobalLock(block)), path.c_str());
     GlobalUnlock(block);
     return reinterpret_cast<LPARAM>(block);
 }
+// What RecordNotify writes for one updated folder.
+std::wstring UpdateDir(const std::wstring& path) { return L"1000 1005 " + path + L" 0"; }
 
 void PostPath(const std::wstring& path) {
     ASSERT_TRUE(PostMessageW(CCalvexReceiversNotifyWindow::GetNotifyWindow(), UpdateFolderMessage(), 0, PathBlock(path)));
 }
 
-std::map<HWND, std::vector<ULONGLONG>> g_viewMessages;
+std::map<HWND, size_t> g_viewMessages;
 
 LRESULT CALLBACK ViewProc(HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam) {
-    if (message == RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message")) {
-        g_viewMessages[hwnd].push_back(GetTickCount64());
-        return 0;
-    }
-    return DefWindowProcW(hwnd, message, wParam, lParam);
-}
-
-HWND NewViewWindow() {
-    static ATOM atom = [] {
-        WNDCLASSW windowClass = {0, ViewProc, 0, 0, GetModuleHandleW(nullptr)};
-        windowClass.lpszClassName = L"TestFolderViewWindow";
-        return RegisterClassW(&windowClass);
-    }();
-    return CreateWindowExW(0, MAKEINTATOM(atom), L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, nullptr, nullptr);
+    if (message != RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message"))
+        return DefWindowProcW(hwnd, message, wParam, lParam);
+    return ++g_viewMessages[hwnd], 0;
 }
 
 template <class T>
@@ -88,47 +71,40 @@ protected:
         CCalvexReceiversNotifyWindow::DestroyInstance();
         CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
     }
-    HWND View() {
-        windows.push_back(NewViewWindow());
+    HWND View() {  // a window that counts the view notification messages it gets
+        static const ATOM atom = [] {
+            WNDCLASSW windowClass = {0, ViewProc, 0, 0, GetModuleHandleW(nullptr)};
+            windowClass.lpszClassName = L"TestFolderViewWindow";
+            return RegisterClassW(&windowClass);
+        }();
+        windows.push_back(CreateWindowExW(0, MAKEINTATOM(atom), L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, nullptr, nullptr));
         return windows.back();
     }
     std::vector<HWND> windows;
 };
 }  // namespace
 
-TEST_F(NotifyWindowTest, BurstOfOnePathGivesOneNotificationASecondAfterTheLast) {
-    const std::wstring path = std::wstring(kRoot) + L"\\123!Z#5!COM3";
+TEST_F(NotifyWindowTest, BurstGoesOutOnceEachPathInOrdinalOrderASecondAfterTheLast) {
     ULONGLONG lastPost = 0;
-    for (int i = 0; i < 3; ++i) {
-        PostPath(path);
+    for (const wchar_t* leaf : {L"b", L"a", L"B", L"a", L"b"}) {
+        PostPath(std::wstring(kRoot) + L"\\" + leaf);
         lastPost = GetTickCount64();
-        testsupport::PumpMessagesFor(400);
+        testsupport::PumpMessagesFor(300);
     }
-    ASSERT_TRUE(testsupport::PumpUntil([] { return !g_notifications.empty(); }, 5000));
-    testsupport::PumpMessagesFor(1500);
-    ASSERT_EQ(1u, g_notifications.size());
-    const Notification& sent = g_notifications[0];
-    EXPECT_EQ(SHCNE_UPDATEDIR, sent.eventId);
-    EXPECT_EQ(0x1005u, sent.flags);
-    EXPECT_EQ(path, sent.path);
-    EXPECT_TRUE(sent.secondItemNull);
-    EXPECT_GE(sent.tick - lastPost, 900u);
-    EXPECT_LE(sent.tick - lastPost, 3000u);
-    const std::string narrow = testsupport::Narrow(path);
-    for (std::string line : {"<==CCalvexReceiversNotifyWindow::BufferEventPath [" + narrow + "]\r\n",
-                              std::string("CCalvexReceiversNotifyWindow::BufferEventPath - set update timer\r\n"),
-                              "==>CCalvexReceiversNotifyWindow::SendUpdateEvents " + narrow + "\r\n"})
-        EXPECT_TRUE(testsupport::TraceContains(line)) << line;
-}
-
-TEST_F(NotifyWindowTest, DistinctPathsGoOutOnceEachInOrdinalOrder) {
-    const std::wstring posted[] = {L"b", L"a", L"B", L"a", L"b"};
-    for (const std::wstring& leaf : posted) PostPath(std::wstring(kRoot) + L"\\" + leaf);
     ASSERT_TRUE(testsupport::PumpUntil([] { return g_notifications.size() >= 3; }, 5000));
     testsupport::PumpMessagesFor(1500);
-    const std::wstring expected[] = {L"B", L"a", L"b"};  // ordinal: upper case sorts first
     ASSERT_EQ(3u, g_notifications.size());
-    for (size_t i = 0; i < 3; ++i) { EXPECT_EQ(std::wstring(kRoot) + L"\\" + expected[i], g_notifications[i].path); }
+    const wchar_t* expected[] = {L"B", L"a", L"b"};  // ordinal: upper case sorts first
+    for (size_t i = 0; i < 3; ++i) {
+        EXPECT_EQ(UpdateDir(std::wstring(kRoot) + L"\\" + expected[i]), g_notifications[i].call);
+        EXPECT_GE(g_notifications[i].tick - lastPost, 900u);
+        EXPECT_LE(g_notifications[i].tick - lastPost, 3000u);
+    }
+    const std::string path = testsupport::Narrow(kRoot) + "\\a";
+    for (std::string line : {"<==CCalvexReceiversNotifyWindow::BufferEventPath [" + path + "]\r\n",
+                              std::string("CCalvexReceiversNotifyWindow::BufferEventPath - set update timer\r\n"),
+                              "==>CCalvexReceiversNotifyWindow::SendUpdateEvents " + path + "\r\n"})
+        EXPECT_TRUE(testsupport::TraceContains(line)) << line;
 }
 
 TEST_F(NotifyWindowTest, PathArrivingWhileSendingGoesOutASecondAfterwards) {
@@ -139,39 +115,22 @@ TEST_F(NotifyWindowTest, PathArrivingWhileSendingGoesOutASecondAfterwards) {
     };
     ASSERT_TRUE(testsupport::PumpUntil([] { return g_notifications.size() >= 2; }, 6000));
     ASSERT_EQ(2u, g_notifications.size());
-    EXPECT_EQ(L"first", g_notifications[0].path);
-    EXPECT_EQ(L"second", g_notifications[1].path);
+    EXPECT_EQ(UpdateDir(L"first"), g_notifications[0].call);
+    EXPECT_EQ(UpdateDir(L"second"), g_notifications[1].call);
     EXPECT_GE(g_notifications[1].tick - g_notifications[0].tick, 900u);
     EXPECT_TRUE(testsupport::TraceContains("CCalvexReceiversNotifyWindow::SendUpdateEvents - set update timer\r\n"));
 }
 
-TEST_F(NotifyWindowTest, OnlyTheUpdateTimerSends) {
-    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
-    ASSERT_NE(nullptr, window);
-    SendMessageW(window, UpdateFolderMessage(), 0, PathBlock(L"pending"));
-    struct { UINT_PTR timerId; size_t expectedCount; } cases[] = {{999, 0}, {1, 0}, {1000, 1}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.timerId);
-        EXPECT_EQ(0, SendMessageW(window, WM_TIMER, c.timerId, 0));
-        EXPECT_EQ(c.expectedCount, g_notifications.size());
-    }
-    testsupport::PumpMessagesFor(1500);
-    EXPECT_EQ(1u, g_notifications.size()) << "the set was emptied and the timer killed";
-}
-
-TEST_F(NotifyWindowTest, WindowOfAnEndedThreadIsMadeAgainOnTheAsker) {
+TEST_F(NotifyWindowTest, WindowLivesOnTheAskerAndUnloadDropsPendingPathsAndTheClass) {
     std::thread([] { EXPECT_TRUE(CCalvexReceiversNotifyWindow::GetNotifyWindow()); }).join();
     HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
-    ASSERT_NE(nullptr, window);
+    ASSERT_NE(nullptr, window) << "the window of an ended thread is made again";
     EXPECT_EQ(GetCurrentThreadId(), GetWindowThreadProcessId(window, nullptr));
     DestroyWindow(window);
-    EXPECT_TRUE(IsWindow(CCalvexReceiversNotifyWindow::GetNotifyWindow())) << "a lost window is made again";
-}
-
-TEST_F(NotifyWindowTest, UnloadDropsPendingPathsAndUnregistersTheClass) {
+    window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
+    EXPECT_TRUE(IsWindow(window)) << "a lost window is made again";
     PostPath(L"never sent");
     testsupport::PumpMessagesFor(200);
-    HWND window = CCalvexReceiversNotifyWindow::GetNotifyWindow();
     CCalvexReceiversNotifyWindow::DestroyInstance();
     EXPECT_FALSE(IsWindow(window));
     WNDCLASSW info;
@@ -180,64 +139,42 @@ TEST_F(NotifyWindowTest, UnloadDropsPendingPathsAndUnregistersTheClass) {
     EXPECT_TRUE(g_notifications.empty());
 }
 
-TEST_F(NotifyWindowTest, FolderWhoseViewRefreshedOrThatIsReleasedSendsNoMessage) {
-    struct Case {
-        const char* name;
-        void (*afterUpdate)(IReceiversShellFolderImpl*& folder);
-        size_t messages;
-    } cases[] = {
-        {"untouched", [](IReceiversShellFolderImpl*&) {}, 1},
-        {"EventReceived", [](IReceiversShellFolderImpl*& f) { EXPECT_EQ(S_OK, f->EventReceived()); }, 0},
-        {"released", [](IReceiversShellFolderImpl*& f) { f->Release(); f = nullptr; }, 0},
-    };
-    std::vector<IReceiversShellFolderImpl*> folders;
-    std::vector<HWND> views;
-    for (size_t i = 0; i < sizeof cases / sizeof cases[0]; ++i) {
-        folders.push_back(NewRootFolder<CBrennorReceiversShellFolder>());
-        views.push_back(View());
-        folders.back()->AddViewWindow(views.back());
-        EXPECT_EQ(S_OK, folders.back()->DoUpdateList());
-    }
-    testsupport::PumpMessagesFor(1000);
-    for (size_t i = 0; i < folders.size(); ++i) cases[i].afterUpdate(folders[i]);
-    testsupport::PumpMessagesFor(6000);
-    for (size_t i = 0; i < folders.size(); ++i) {
-        SCOPED_TRACE(cases[i].name);
-        EXPECT_EQ(cases[i].messages, g_viewMessages[views[i]].size());
-        if (folders[i]) folders[i]->Release();
-    }
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl2::EventReceived\r\n"));
-}
-
-TEST_F(NotifyWindowTest, FolderListsEachViewWindowOnce) {
-    ComObject<CCalvexReceiversShellFolder>* folder = NewRootFolder<CCalvexReceiversShellFolder>();
-    ASSERT_NE(nullptr, folder);
-    HWND a = View(), b = View(), removed = View(), never = View();
+// Folders tell each listed view once, five seconds on, unless it refreshed meanwhile or the folder is gone.
+TEST_F(NotifyWindowTest, FolderTellsEachListedViewOnceUnlessRefreshedOrReleased) {
+    ComObject<CCalvexReceiversShellFolder>* listed = NewRootFolder<CCalvexReceiversShellFolder>();
+    ComObject<CBrennorReceiversShellFolder>* refreshed = NewRootFolder<CBrennorReceiversShellFolder>();
+    ComObject<CBrennorReceiversShellFolder>* released = NewRootFolder<CBrennorReceiversShellFolder>();
+    ASSERT_TRUE(listed && refreshed && released);
+    HWND a = View(), b = View(), removed = View(), never = View(), refreshedView = View(), releasedView = View();
     struct { bool add; HWND hwnd; size_t count; } steps[] = {
         {true, a, 1}, {true, a, 1}, {true, b, 2}, {true, removed, 3}, {false, removed, 2}, {false, never, 2},
     };
     for (const auto& step : steps) {
-        step.add ? folder->AddViewWindow(step.hwnd) : folder->RemoveViewWindow(step.hwnd);
-        EXPECT_EQ(step.count, folder->ViewWindowCount());
+        step.add ? listed->AddViewWindow(step.hwnd) : listed->RemoveViewWindow(step.hwnd);
+        EXPECT_EQ(step.count, listed->ViewWindowCount());
     }
-    EXPECT_EQ(S_OK, folder->DoUpdateList());
-    testsupport::PumpMessagesFor(6500);
-    EXPECT_EQ(1u, g_viewMessages[a].size());
-    EXPECT_EQ(1u, g_viewMessages[b].size());
-    EXPECT_EQ(0u, g_viewMessages[removed].size());
-    EXPECT_EQ(0u, g_viewMessages[never].size());
-
     // The array grows past its first capacities and shrinks back.
-    for (UINT_PTR i = 1; i <= 100; ++i) folder->AddViewWindow(reinterpret_cast<HWND>(i * 16));
-    EXPECT_EQ(102u, folder->ViewWindowCount());
-    for (UINT_PTR i = 1; i <= 100; ++i) folder->RemoveViewWindow(reinterpret_cast<HWND>(i * 16));
-    EXPECT_EQ(2u, folder->ViewWindowCount());
-    folder->Release();
-    EXPECT_EQ(1u, g_notifications.size()) << "the shell heard once of the folder";
+    for (bool add : {true, false}) {
+        for (UINT_PTR i = 1; i <= 100; ++i) add ? listed->AddViewWindow(HWND(i * 16)) : listed->RemoveViewWindow(HWND(i * 16));
+        EXPECT_EQ(add ? 102u : 2u, listed->ViewWindowCount());
+    }
+    refreshed->AddViewWindow(refreshedView);
+    released->AddViewWindow(releasedView);
+    IReceiversShellFolderImpl* folders[] = {listed, refreshed, released};
+    for (IReceiversShellFolderImpl* folder : folders) EXPECT_EQ(S_OK, folder->DoUpdateList());
+    testsupport::PumpMessagesFor(1000);
+    EXPECT_EQ(S_OK, refreshed->EventReceived());
+    released->Release();
+    testsupport::PumpMessagesFor(6000);
+    for (HWND hwnd : {a, b, removed, never, refreshedView, releasedView}) { EXPECT_EQ(hwnd == a || hwnd == b, g_viewMessages[hwnd]); }
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl2::EventReceived\r\n"));
+    listed->Release();
+    refreshed->Release();
+    EXPECT_EQ(2u, g_notifications.size()) << "the shell heard once of each brand's root";
 
-    ASSERT_EQ(S_OK, CreateComObject<CCalvexReceiversShellFolder>(&folder));  // never initialised: no path
-    EXPECT_EQ(S_FALSE, folder->DoUpdateList());
+    ASSERT_EQ(S_OK, CreateComObject<CCalvexReceiversShellFolder>(&listed));  // never initialised: no path
+    EXPECT_EQ(S_FALSE, listed->DoUpdateList());
     testsupport::PumpMessagesFor(1500);
-    EXPECT_EQ(1u, g_notifications.size());
-    folder->Release();
+    EXPECT_EQ(2u, g_notifications.size());
+    listed->Release();
 }

@@ -4,6 +4,7 @@
 #include <cstring>
 #include <functional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "items/CReceiversPidlMgr.h"
@@ -23,10 +24,7 @@ protected:
     // Items written "type:name", joined with "|".
     UniquePidl Make(const std::vector<std::pair<DWORD, std::wstring>>& items) {
         UniquePidl list;
-        for (const auto& entry : items) {
-            UniquePidl item = Own(mgr.Create(entry.first, entry.second.c_str()));
-            list = Own(mgr.Concatenate(list.Get(), item.Get()));
-        }
+        for (const auto& entry : items) list = Own(mgr.Concatenate(list.Get(), Own(mgr.Create(entry.first, entry.second.c_str())).Get()));
         return list;
     }
     std::wstring Describe(LPCITEMIDLIST list) {
@@ -41,10 +39,7 @@ protected:
 };
 
 TEST_F(PidlManagerTest, CreateWritesTheWireLayoutAndNothingElse) {
-    const struct {
-        const wchar_t* name;
-        USHORT cb;
-    } cases[] = {{L"", 29}, {L"0123456789", 49}, {L"FILE.qpr", 45}};
+    const struct { const wchar_t* name; USHORT cb; } cases[] = {{L"", 29}, {L"0123456789", 49}, {L"FILE.qpr", 45}};
     for (const auto& c : cases) {
         UniquePidl item = Own(mgr.Create(ItemTypeFile, c.name));
         ASSERT_TRUE(item);
@@ -53,9 +48,7 @@ TEST_F(PidlManagerTest, CreateWritesTheWireLayoutAndNothingElse) {
         USHORT cb, terminator;
         DWORD type;
         memcpy(&cb, bytes, 2), memcpy(&type, bytes + 2, 4), memcpy(&terminator, bytes + cb, 2);
-        EXPECT_EQ(cb, c.cb);
-        EXPECT_EQ(type, 6u);
-        EXPECT_EQ(terminator, 0);
+        EXPECT_EQ(std::make_tuple(cb, type, terminator), std::make_tuple(c.cb, 6ul, USHORT(0)));
         const size_t nameEnd = 18 + (wcslen(c.name) + 1) * 2;
         EXPECT_EQ(memcmp(bytes + 18, c.name, nameEnd - 18), 0);
         EXPECT_EQ(cb - nameEnd, 9u) << "9 slack bytes";
@@ -70,20 +63,12 @@ TEST_F(PidlManagerTest, CreateWritesTheWireLayoutAndNothingElse) {
 }
 
 TEST_F(PidlManagerTest, PathsGiveRootReceiverAndFile) {
-    const struct {
-        const wchar_t* path;
-        DWORD brand;
-        std::wstring items, last;
-    } cases[] = {
+    const struct { const wchar_t* path; DWORD brand; std::wstring items, last; } cases[] = {
         {L"\\\\Calvex Receivers//123!Z#5!COM3\\\\", 1, L"1:Calvex Receivers|3:123!Z#5!COM3", L"3:123!Z#5!COM3"},
         {L"c0/c1/c2/c3/c4", 2, L"2:c0|4:c1|6:c2\\c3\\c4", L"6:c2\\c3\\c4"},
         {L"r\\k\\LOG1.qpr", 1, L"1:r|3:k|6:LOG1.qpr", L"6:LOG1.qpr"},
-        {L"/only/", 2, L"2:only", L"2:only"},
-        {L"a\\b", 5, L"1:a|3:b", L"3:b"},
-        {L"", 1, L"", L""},
-        {L"\\//\\", 1, L"", L""},
-        {nullptr, 1, L"", L""},
-    };
+        {L"/only/", 2, L"2:only", L"2:only"}, {L"a\\b", 5, L"1:a|3:b", L"3:b"},
+        {L"", 1, L"", L""}, {L"\\//\\", 1, L"", L""}, {nullptr, 1, L"", L""}};
     for (const auto& c : cases) {
         SCOPED_TRACE(c.path ? testsupport::Narrow(c.path) : "null");
         UniquePidl full = Own(mgr.CreateFromPath(c.path, c.brand)), last = Own(mgr.CreateLastFromPath(c.path, c.brand));
@@ -101,36 +86,27 @@ TEST_F(PidlManagerTest, ListOperationsOnEmptyNullAndShortLists) {
     const BYTE emptyBytes[2] = {0, 0};
     auto empty = reinterpret_cast<LPCITEMIDLIST>(emptyBytes);
     UniquePidl one = Make({{1, kRoot}}), three = Make({{1, kRoot}, {3, kKey}, {6, L"FILE.qpr"}});
-    EXPECT_EQ(mgr.GetSize(nullptr), 0u);
-    EXPECT_EQ(mgr.GetSize(empty), 2u);
-    EXPECT_EQ(mgr.GetSize(three.Get()), 2u + 61 + 53 + 45);
-    EXPECT_EQ(mgr.GetItemCount(nullptr) + mgr.GetItemCount(empty), 0u);
-    EXPECT_EQ(mgr.GetItemCount(three.Get()), 3u);
+    EXPECT_EQ(std::make_tuple(mgr.GetSize(nullptr), mgr.GetSize(empty), mgr.GetSize(three.Get())),
+              std::make_tuple(0u, 2u, 2u + 61 + 53 + 45));
+    EXPECT_EQ(std::make_tuple(mgr.GetItemCount(nullptr), mgr.GetItemCount(empty), mgr.GetItemCount(three.Get())),
+              std::make_tuple(0u, 0u, 3u));
     EXPECT_EQ(mgr.GetLastItemType(three.Get()), 6u);
-    for (LPCITEMIDLIST list : {static_cast<LPCITEMIDLIST>(nullptr), empty}) {
-        EXPECT_EQ(mgr.GetLastItem(list), nullptr);
-        EXPECT_EQ(mgr.CopyFrom(list, 0), nullptr);
-    }
-    EXPECT_EQ(mgr.GetNextItem(nullptr), nullptr);
-    EXPECT_EQ(mgr.GetData(nullptr), nullptr);
-    EXPECT_EQ(mgr.CopyParent(one.Get()), nullptr);
-    EXPECT_EQ(mgr.CopyParent(nullptr), nullptr);
-    EXPECT_EQ(mgr.CopyFrom(three.Get(), 3), nullptr);
-    EXPECT_EQ(mgr.Concatenate(nullptr, nullptr), nullptr);
+    const void* nulls[] = {mgr.GetLastItem(nullptr), mgr.GetLastItem(empty), mgr.CopyFrom(nullptr, 0), mgr.CopyFrom(empty, 0),
+                           mgr.GetNextItem(nullptr), mgr.GetData(nullptr), mgr.CopyParent(one.Get()), mgr.CopyParent(nullptr),
+                           mgr.CopyFrom(three.Get(), 3), mgr.Concatenate(nullptr, nullptr)};
+    for (size_t i = 0; i < sizeof nulls / sizeof nulls[0]; ++i) { EXPECT_EQ(nulls[i], nullptr) << i; }
 
     UniquePidl parent = Own(mgr.CopyParent(three.Get())), tail = Own(mgr.CopyFrom(three.Get(), 1));
     UniquePidl whole = Own(mgr.CopyFrom(three.Get(), 0)), middle = Own(mgr.CopyItem(mgr.GetNextItem(three.Get())));
-    UniquePidl copyOfSecond = Own(mgr.Concatenate(nullptr, one.Get()));
-    UniquePidl joined = Own(mgr.Concatenate(parent.Get(), tail.Get()));
+    UniquePidl copyOfSecond = Own(mgr.Concatenate(nullptr, one.Get())), joined = Own(mgr.Concatenate(parent.Get(), tail.Get()));
     const std::wstring root = L"1:Calvex Receivers", key = L"|3:123!Z#5!COM3", file = L"|6:FILE.qpr";
-    EXPECT_EQ(Describe(parent.Get()), root + key) << "and Concatenate left it alone";
-    EXPECT_EQ(Describe(tail.Get()), key.substr(1) + file);
-    EXPECT_EQ(Describe(whole.Get()), root + key + file);
-    EXPECT_EQ(Describe(middle.Get()), key.substr(1));
+    const struct { const UniquePidl& list; std::wstring items; } copies[] = {
+        {parent, root + key},  // and Concatenate left it alone
+        {tail, key.substr(1) + file}, {whole, root + key + file}, {middle, key.substr(1)},
+        {copyOfSecond, root}, {joined, root + key + key + file}};
+    for (const auto& c : copies) { EXPECT_EQ(Describe(c.list.Get()), c.items); }
     EXPECT_EQ(mgr.GetSize(middle.Get()), 53u + 2);
-    EXPECT_EQ(Describe(copyOfSecond.Get()), root);
     EXPECT_NE(copyOfSecond.Get(), one.Get());
-    EXPECT_EQ(Describe(joined.Get()), root + key + key + file);
 }
 
 TEST_F(PidlManagerTest, FileFieldsArePackedAndSurviveCopies) {
@@ -139,20 +115,14 @@ TEST_F(PidlManagerTest, FileFieldsArePackedAndSurviveCopies) {
     file->size = 0x89ABCDEF;
     file->time = 45000.25;
     UniquePidl copy = Own(mgr.CopyFrom(list.Get(), 1));
-    EXPECT_EQ(mgr.GetData(copy.Get())->size, 0x89ABCDEFu);
-    EXPECT_EQ(mgr.GetData(copy.Get())->time, 45000.25);
+    EXPECT_EQ(std::make_pair(mgr.GetData(copy.Get())->size, mgr.GetData(copy.Get())->time), std::make_pair(0x89ABCDEFul, 45000.25));
     DWORD size;  // the second item starts at an odd offset
     memcpy(&size, reinterpret_cast<const BYTE*>(list.Get()) + 61 + 6, 4);
     EXPECT_EQ(size, 0x89ABCDEFu);
 }
 
 TEST_F(PidlManagerTest, PathTexts) {
-    const struct {
-        std::vector<std::pair<DWORD, std::wstring>> items;
-        bool keepKeys;
-        const wchar_t* text;
-        UINT result;
-    } cases[] = {
+    const struct { std::vector<std::pair<DWORD, std::wstring>> items; bool keepKeys; const wchar_t* text; UINT result; } cases[] = {
         {{{1, kRoot}, {3, kKey}, {6, L"FILE.qpr"}}, false, L"Calvex Receivers\\Z/5@COM3\\FILE.qpr", 34},
         {{{1, kRoot}, {3, kKey}, {6, L"FILE.qpr"}}, true, L"Calvex Receivers\\123!Z#5!COM3\\FILE.qpr", 38},
         {{{2, kRoot}, {4, L"9!A#B#C!USB"}}, false, L"Calvex Receivers\\A/B/C@USB", 26},
@@ -173,16 +143,9 @@ TEST_F(PidlManagerTest, PathTexts) {
 }
 
 TEST_F(PidlManagerTest, ColumnTexts) {
-    UniquePidl receiver = Make({{3, kKey}}), twoFields = Make({{4, L"123!Z#5"}}), root = Make({{1, kRoot}});
-    UniquePidl file = Make({{6, L"F"}});
+    UniquePidl receiver = Make({{3, kKey}}), twoFields = Make({{4, L"123!Z#5"}}), root = Make({{1, kRoot}}), file = Make({{6, L"F"}});
     ReceiverItemData* data = mgr.GetData(file.Get());
-    const struct {
-        LPCITEMIDLIST item;
-        int column;
-        const wchar_t* text;
-        DWORD size;
-        DATE time;
-    } cases[] = {
+    const struct { LPCITEMIDLIST item; int column; const wchar_t* text; DWORD size; DATE time; } cases[] = {
         {receiver.Get(), 0, kKey},      {receiver.Get(), 1, L"123"},  {receiver.Get(), 2, L"Z/5"},
         {receiver.Get(), 3, L"COM3"},   {receiver.Get(), 4, L""},     {twoFields.Get(), 3, L""},
         {twoFields.Get(), 2, L"Z/5"},   {root.Get(), 0, kRoot},       {root.Get(), 1, L""},
@@ -211,20 +174,13 @@ TEST_F(PidlManagerTest, ColumnTexts) {
 
 TEST_F(PidlManagerTest, AllocationFailuresGiveNull) {
     UniquePidl three = Make({{1, kRoot}, {3, kKey}, {6, L"F"}});
-    const struct {
-        const char* what;
-        std::function<LPITEMIDLIST()> call;
-        int successes;
-    } cases[] = {
-        {"Create", [&] { return mgr.Create(1, L"x"); }, 0},
-        {"Copy", [&] { return mgr.Copy(three.Get()); }, 0},
-        {"CopyParent", [&] { return mgr.CopyParent(three.Get()); }, 0},
-        {"CopyItem", [&] { return mgr.CopyItem(three.Get()); }, 0},
-        {"Concatenate", [&] { return mgr.Concatenate(three.Get(), three.Get()); }, 0},
-    };
-    for (const auto& c : cases) {
-        malloc.FailAfter(c.successes);
-        EXPECT_EQ(c.call(), nullptr) << c.what;
+    const std::function<LPITEMIDLIST()> calls[] = {
+        [&] { return mgr.Create(1, L"x"); }, [&] { return mgr.Copy(three.Get()); },
+        [&] { return mgr.CopyParent(three.Get()); }, [&] { return mgr.CopyItem(three.Get()); },
+        [&] { return mgr.Concatenate(three.Get(), three.Get()); }};
+    for (const auto& call : calls) {
+        malloc.FailAfter(0);
+        EXPECT_EQ(call(), nullptr) << &call - calls;
     }
     for (int successes = 0; successes < 5; ++successes) {  // root, receiver, join, file, last join
         malloc.FailAfter(successes);

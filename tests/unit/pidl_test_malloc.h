@@ -10,17 +10,14 @@
 class GuardedMalloc : public IMalloc {
 public:
     static constexpr BYTE kFill = 0xCD;
+    static constexpr size_t kPage = 4096;
 
     static void* GuardedBlock(size_t bytes) {
-        SYSTEM_INFO info;
-        GetSystemInfo(&info);
-        const size_t page = info.dwPageSize, dataPages = (bytes + page - 1) / page;
-        auto* base = static_cast<BYTE*>(
-            VirtualAlloc(nullptr, (dataPages + 1) * page, MEM_RESERVE | MEM_COMMIT, PAGE_READWRITE));
-        if (!base) return nullptr;
+        const size_t dataPages = (bytes + kPage - 1) / kPage;
+        auto* base = static_cast<BYTE*>(VirtualAlloc(nullptr, (dataPages + 1) * kPage, MEM_RESERVE | MEM_COMMIT, PAGE_READWRITE));
         DWORD old = 0;
-        VirtualProtect(base + dataPages * page, page, PAGE_NOACCESS, &old);
-        return memset(base + dataPages * page - bytes, kFill, bytes);
+        if (!base || !VirtualProtect(base + dataPages * kPage, kPage, PAGE_NOACCESS, &old)) return nullptr;
+        return memset(base + dataPages * kPage - bytes, kFill, bytes);
     }
     static void FreeGuardedBlock(void* block) {
         MEMORY_BASIC_INFORMATION info;
@@ -34,9 +31,7 @@ public:
 
     STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override {
         *ppv = IsEqualIID(riid, IID_IUnknown) || IsEqualIID(riid, IID_IMalloc) ? static_cast<IMalloc*>(this) : nullptr;
-        if (!*ppv) return E_NOINTERFACE;
-        AddRef();
-        return S_OK;
+        return *ppv ? (AddRef(), S_OK) : E_NOINTERFACE;
     }
     // Lives on the test's stack: the count is only looked at.
     STDMETHODIMP_(ULONG) AddRef() override { return ++m_refs; }
@@ -52,10 +47,7 @@ public:
     STDMETHODIMP_(void) Free(void* block) override {
         if (block && m_blocks.erase(block)) FreeGuardedBlock(block);
     }
-    STDMETHODIMP_(SIZE_T) GetSize(void* block) override {
-        auto found = m_blocks.find(block);
-        return found == m_blocks.end() ? static_cast<SIZE_T>(-1) : found->second;
-    }
+    STDMETHODIMP_(SIZE_T) GetSize(void* block) override { return DidAlloc(block) ? m_blocks[block] : static_cast<SIZE_T>(-1); }
     STDMETHODIMP_(int) DidAlloc(void* block) override { return m_blocks.count(block) ? 1 : 0; }
     STDMETHODIMP_(void) HeapMinimize() override {}
 

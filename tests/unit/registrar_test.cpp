@@ -17,9 +17,9 @@ std::wstring Script(const std::wstring& body) {
            L"\n   }\n  }\n }\n}\n";
 }
 
-bool KeyExists(const std::wstring& sub) {
+bool KeyExists(const std::wstring& sub, const wchar_t* root = kRoot) {
     UniqueRegKey key;
-    return !RegOpenKeyExW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), 0, KEY_READ, key.Put());
+    return !RegOpenKeyExW(HKEY_CURRENT_USER, (std::wstring(root) + L"\\" + sub).c_str(), 0, KEY_READ, key.Put());
 }
 
 // The value as text ("<none>" when missing); a DWORD in hexadecimal.
@@ -53,44 +53,29 @@ TEST_F(RegistrarTest, RegistersKeysValuesAndSubstitutions) {
         L" 'Key With Spaces' = s 'x'\n}");
     ASSERT_EQ(S_OK, registrar.RunScript(script, true));
     const std::wstring clsid = L"{E102076F-4057-4e7f-8209-511258F12B62}";
-    struct Expectation { std::wstring key; const wchar_t* name; std::wstring value; } expected[] = {
-        {clsid, nullptr, L"Calvex GNSS Receivers"},
+    struct { std::wstring key; const wchar_t* name; std::wstring value; } expected[] = {
+        {clsid, nullptr, L"Calvex GNSS Receivers"}, {clsid + L"\\Key With Spaces", nullptr, L"x"},
         {clsid + L"\\DefaultIcon", nullptr, L"C:\\dir\\It's.dll,0"},
         {clsid + L"\\InprocServer32", nullptr, L"C:\\dir\\It's.dll"},
         {clsid + L"\\InprocServer32", L"ThreadingModel", L"Apartment"},
         {clsid, L"InfoTip", L"It's 100% text"},
-        {clsid + L"\\Key With Spaces", nullptr, L"x"},
         {clsid, L"Number", L"0xA0000000"},
     };
     for (const auto& e : expected) { EXPECT_EQ(e.value, Value(e.key, e.name)) << testing::PrintToString(e.key); }
     EXPECT_TRUE(KeyExists(clsid + L"\\ShellFolder"));
 }
 
-TEST_F(RegistrarTest, ForceRemoveReplacesOnRegistrationAndRemovesWholeOnRemoval) {
+TEST_F(RegistrarTest, ForceRemoveKeysAreReplacedAndRemovedWholeNoRemoveAndForeignKeysStay) {
     ASSERT_EQ(S_OK, registrar.RunScript(Script(L"Owned { Stale = s 'old' }"), true));
-    const std::wstring script = Script(L"ForceRemove Owned = s 'new'\n{\n Fresh = s 'f'\n}");
+    const std::wstring script = Script(L"ForceRemove Owned = s 'new'\n{\n Fresh = s 'f'\n}\n"
+                                       L"NoRemove Shared\n{\n val Ours = s '1'\n Mine = s 'm'\n}\nPlain = s 'p'\n{\n Child = s 'c'\n}");
     ASSERT_EQ(S_OK, registrar.RunScript(script, true));
-    EXPECT_FALSE(KeyExists(L"Owned\\Stale")) << "the old subtree is replaced";
-    EXPECT_TRUE(KeyExists(L"Owned\\Fresh"));
-    // Someone else's key below a ForceRemove key goes too.
-    ASSERT_EQ(S_OK, registrar.RunScript(Script(L"Owned { Foreign = s 'f' }"), true));
+    EXPECT_TRUE(!KeyExists(L"Owned\\Stale") && KeyExists(L"Owned\\Fresh")) << "the old subtree is replaced";
+    ASSERT_EQ(S_OK, registrar.RunScript(Script(L"Owned { Foreign = s 'f' }\nPlain { Foreign = s 'f' }"), true));
     ASSERT_EQ(S_OK, registrar.RunScript(script, false));
-    EXPECT_FALSE(KeyExists(L"Owned"));
-}
-
-TEST_F(RegistrarTest, RemovalKeepsNoRemoveKeysAndForeignSubkeys) {
-    const std::wstring script = Script(
-        L"NoRemove Shared\n{\n val Ours = s '1'\n Mine = s 'm'\n}\nPlain = s 'p'\n{\n Child = s 'c'\n}");
-    ASSERT_EQ(S_OK, registrar.RunScript(script, true));
-    ASSERT_EQ(S_OK, registrar.RunScript(Script(L"Plain { Foreign = s 'f' }"), true));
-    ASSERT_EQ(S_OK, registrar.RunScript(script, false));
-    struct { const wchar_t* key; bool exists; } after[] = {
-        {L"Shared", true},         // NoRemove
-        {L"Shared\\Mine", false},  // plain key below it
-        {L"Plain", true},          // still holds a key that is not ours
-        {L"Plain\\Child", false},
-        {L"Plain\\Foreign", true},
-    };
+    // Someone else's key goes with a ForceRemove key and keeps a plain one; NoRemove stays, a plain key below it goes.
+    struct { const wchar_t* key; bool exists; } after[] = {{L"Owned", false}, {L"Shared", true}, {L"Shared\\Mine", false},
+                                                           {L"Plain", true}, {L"Plain\\Child", false}, {L"Plain\\Foreign", true}};
     for (const auto& a : after) { EXPECT_EQ(a.exists, KeyExists(a.key)) << testing::PrintToString(std::wstring(a.key)); }
     EXPECT_EQ(L"<none>", Value(L"Shared", L"Ours")) << "named values are removed";
     EXPECT_EQ(S_OK, registrar.RunScript(script, false)) << "removing twice is fine";
@@ -105,7 +90,6 @@ TEST_F(RegistrarTest, MalformedScriptsFailWithoutWriting) {
     };
     for (const wchar_t* script : scripts) {
         EXPECT_TRUE(FAILED(registrar.RunScript(script, true))) << testing::PrintToString(std::wstring(script));
-        UniqueRegKey key;
-        EXPECT_NE(ERROR_SUCCESS, RegOpenKeyExW(HKEY_CURRENT_USER, L"Software\\Probe", 0, KEY_READ, key.Put()));
+        EXPECT_FALSE(KeyExists(L"Probe", L"Software"));
     }
 }

@@ -2,22 +2,22 @@
 #include <windows.h>
 #include <commctrl.h>
 
+#include <climits>
 #include <cstdlib>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include <gtest/gtest.h>
 
+#include "com/ComPtr.h"
+#include "com/Handles.h"
 #include "items/CCalvexReceiversExtractIcon.h"
 #include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "resources/resource.h"
 
 namespace {
-HICON ModuleIcon(WORD id, int size) {
-    return static_cast<HICON>(LoadImageW(ModuleInstance(), MAKEINTRESOURCEW(id), IMAGE_ICON, size, size, LR_CREATEDIBSECTION));
-}
-
 // The icon drawn on white into a 32-bit bitmap, so that icons from an image list and from
 // resources compare alike; empty for no icon.
 std::vector<BYTE> Pixels(HICON icon, int size) {
@@ -38,18 +38,19 @@ std::vector<BYTE> Pixels(HICON icon, int size) {
     return pixels;
 }
 
-// The item icon resource whose picture is nearest to the icon.
+// The icon resource whose picture is nearest to the icon. A tie goes to the earlier of this
+// list, so two resources of one picture make some kind come out wrong.
 int NearestResource(HICON icon, int size) {
     const std::vector<BYTE> pixels = Pixels(icon, size);
     int nearest = 0;
-    long best = -1;
-    for (WORD id : {IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE}) {
-        HICON loaded = ModuleIcon(id, size);
-        const std::vector<BYTE> other = Pixels(loaded, size);
-        DestroyIcon(loaded);
+    long best = LONG_MAX;
+    for (WORD id : {IDI_MODULE, IDI_FILE, IDI_NOITEM, IDI_BRENNOR, IDI_CALVEX}) {
+        UniqueIcon loaded(static_cast<HICON>(LoadImageW(ModuleInstance(), MAKEINTRESOURCEW(id), IMAGE_ICON, size, size, LR_CREATEDIBSECTION)));
+        const std::vector<BYTE> other = Pixels(loaded.Get(), size);
+        if (other.size() != pixels.size()) continue;  // a resource missing at this size
         long distance = 0;
         for (size_t i = 0; i < pixels.size(); ++i) distance += std::abs(pixels[i] - other[i]);
-        if (best < 0 || distance < best) best = distance, nearest = id;
+        if (distance < best) best = distance, nearest = id;
     }
     return nearest;
 }
@@ -71,34 +72,13 @@ TEST(Resources, StringTable) {
     for (const auto& s : strings) { EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id; }
 }
 
-TEST(Resources, IconsAtEachSizeAreDistinctPictures) {
-    const WORD ids[] = {IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE, IDI_MODULE};
-    for (int size : {16, 32, 48}) {
-        std::vector<std::vector<BYTE>> pictures;
-        for (WORD id : ids) {
-            HICON icon = ModuleIcon(id, size);
-            pictures.push_back(Pixels(icon, size));
-            DestroyIcon(icon);
-            ASSERT_EQ(static_cast<size_t>(size * size * 4), pictures.back().size()) << id << " at " << size;
-        }
-        for (size_t a = 0; a < pictures.size(); ++a)
-            for (size_t b = a + 1; b < pictures.size(); ++b)
-                EXPECT_NE(pictures[a], pictures[b]) << ids[a] << " and " << ids[b] << " at " << size;
-    }
-}
-
 TEST(Resources, DialogTemplatesHoldTheirControls) {
     struct { WORD dialog; int control; const wchar_t* text; } controls[] = {  // control 0: the caption
         {IDD_PROGRESS, 0, L"Progress..."},             {IDD_PROGRESS, IDCANCEL, L"Cancel"},
         {IDD_PROGRESS, IDC_PROGRESS_STATUS, L"Waiting for download..."},
         {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},         {IDD_FIND, IDCANCEL, L"Stop"},
         {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},    {IDD_FIND, IDC_FIND_STATIC, L""},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_RECEIVER, L"Receiver:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_MODEL, L"Model:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_SERIAL, L"ID:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_LABEL_PORT, L"Port:"},
-        {IDD_RECEIVER_PROPERTIES, IDC_PROP_RECEIVER, L""}, {IDD_RECEIVER_PROPERTIES, IDC_PROP_PORT, L""},
-    };
+    };  // the properties page's controls: shell_view_test reads them filled in
     HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
     for (const auto& c : controls) {
         HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, NoProc, 0);
@@ -120,64 +100,49 @@ TEST(Resources, ImageListsHoldSixImagesAtSystemSizes) {
         {SmallImageList(), GetSystemMetrics(SM_CXSMICON), GetSystemMetrics(SM_CYSMICON)},
     };
     for (const auto& l : lists) {
-        ASSERT_NE(nullptr, l.list);
-        EXPECT_EQ(6, ImageList_GetImageCount(l.list));
         int cx = 0, cy = 0;
         ImageList_GetIconSize(l.list, &cx, &cy);
-        EXPECT_EQ(l.cx, cx);
-        EXPECT_EQ(l.cy, cy);
+        EXPECT_EQ(std::make_tuple(6, l.cx, l.cy), std::make_tuple(ImageList_GetImageCount(l.list), cx, cy));
     }
 }
 
-TEST(ExtractIcon, IndexIsTheLastItemKindLessOne) {
+// The icon index is the last item's kind less one, and Extract draws that kind's picture at both sizes.
+TEST(ExtractIcon, EachKindGetsItsIndexAndPicture) {
+    ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
+    const int large = GetSystemMetrics(SM_CXICON), small = GetSystemMetrics(SM_CXSMICON);
     CReceiversPidlMgr mgr;
-    auto List = [&](std::initializer_list<std::pair<DWORD, const wchar_t*>> items) {
-        UniquePidl list;
-        for (const auto& item : items) {
-            UniquePidl one(mgr, mgr.Create(item.first, item.second));
-            list = UniquePidl(mgr, mgr.Concatenate(list.Get(), one.Get()));
-        }
-        return list;
-    };
-    const struct { UniquePidl list; int index; } cases[] = {
-        {List({{1, L"Calvex Receivers"}}), 0}, {List({{2, L"Calvex Receivers"}}), 1}, {List({{3, L"1!M!COM3"}}), 2},
-        {List({{4, L"1!M!COM3"}}), 3},         {List({{6, L"FILE.qpr"}}), 5},
-        {List({{2, L"Calvex Receivers"}, {4, L"1!M!COM3"}, {6, L"FILE.qpr"}}), 5},
+    const struct { std::vector<std::pair<DWORD, const wchar_t*>> items; int index, picture; } cases[] = {
+        {{{1, L"Calvex Receivers"}}, 0, IDI_CALVEX}, {{{2, L"Calvex Receivers"}}, 1, IDI_BRENNOR},
+        {{{3, L"1!M!COM3"}}, 2, IDI_CALVEX},         {{{4, L"1!M!COM3"}}, 3, IDI_BRENNOR},
+        {{{5, L"none"}}, 4, IDI_NOITEM},             {{{6, L"FILE.qpr"}}, 5, IDI_FILE},
+        {{{2, L"Calvex Receivers"}, {4, L"1!M!COM3"}, {6, L"FILE.qpr"}}, 5, IDI_FILE},
     };
     for (const auto& c : cases) {
-        ComObject<CCalvexReceiversExtractIcon>* object = nullptr;
+        SCOPED_TRACE(c.index);
+        UniquePidl list;
+        for (const auto& item : c.items)
+            list = UniquePidl(mgr, mgr.Concatenate(list.Get(), UniquePidl(mgr, mgr.Create(item.first, item.second)).Get()));
+        ComPtr<ComObject<CCalvexReceiversExtractIcon>> object;
         ASSERT_EQ(CreateComObject<CCalvexReceiversExtractIcon>(&object), S_OK);
-        ASSERT_EQ(object->SetItem(c.list.Get()), S_OK);
-        wchar_t location[16], before[16];
-        wmemset(location, L'#', 16), wmemset(before, L'#', 16);
+        ASSERT_EQ(object->SetItem(list.Get()), S_OK);
+        wchar_t location[16];
+        wmemset(location, L'#', 16);
         int index = -7;
         UINT flags = 0;
         EXPECT_EQ(object->GetIconLocation(GIL_FORSHELL, location, 16, &index, &flags), S_OK);
-        EXPECT_EQ(index, c.index);
-        EXPECT_EQ(flags, static_cast<UINT>(GIL_NOTFILENAME));
-        EXPECT_EQ(wmemcmp(location, before, 16), 0) << "the location buffer was written";
-        object->Release();
+        EXPECT_EQ(std::make_pair(index, flags), std::make_pair(c.index, UINT(GIL_NOTFILENAME)));
+        EXPECT_EQ(std::wstring(location, 16), std::wstring(16, L'#')) << "the location buffer was written";
+        HICON bigIcon = nullptr, smallIcon = nullptr;
+        ASSERT_EQ(object->Extract(L"ignored", index, &bigIcon, &smallIcon, MAKELONG(large, small)), S_OK);
+        ASSERT_TRUE(bigIcon && smallIcon);
+        EXPECT_EQ(std::make_pair(NearestResource(bigIcon, large), NearestResource(smallIcon, small)),
+                  std::make_pair(c.picture, c.picture));
+        DestroyIcon(bigIcon), DestroyIcon(smallIcon);
     }
-}
-
-TEST(ExtractIcon, ExtractGivesTheKindsPictureAtBothSizes) {
-    ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
-    const int large = GetSystemMetrics(SM_CXICON), small = GetSystemMetrics(SM_CXSMICON);
-    const int expected[] = {IDI_CALVEX, IDI_BRENNOR, IDI_CALVEX, IDI_BRENNOR, IDI_NOITEM, IDI_FILE};
     IExtractIconW* extract = nullptr;
     ASSERT_EQ(CreateCalvexReceiversExtractIcon(nullptr, IID_IExtractIconW, reinterpret_cast<void**>(&extract)), S_OK);
-    for (UINT index = 0; index < 6; ++index) {
-        HICON bigIcon = nullptr, smallIcon = nullptr;
-        ASSERT_EQ(extract->Extract(L"ignored", index, &bigIcon, &smallIcon, MAKELONG(large, small)), S_OK);
-        ASSERT_TRUE(bigIcon && smallIcon) << index;
-        EXPECT_EQ(NearestResource(bigIcon, large), expected[index]) << "large " << index;
-        EXPECT_EQ(NearestResource(smallIcon, small), expected[index]) << "small " << index;
-        DestroyIcon(bigIcon);
-        DestroyIcon(smallIcon);
-    }
     HICON bigIcon = reinterpret_cast<HICON>(1), smallIcon = reinterpret_cast<HICON>(1);
     EXPECT_EQ(extract->Extract(nullptr, 9, &bigIcon, &smallIcon, 0), S_OK) << "no check of the index";
-    EXPECT_EQ(bigIcon, nullptr);
-    EXPECT_EQ(smallIcon, nullptr);
+    EXPECT_TRUE(!bigIcon && !smallIcon);
     extract->Release();
 }
