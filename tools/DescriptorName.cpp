@@ -7,7 +7,6 @@
 const wchar_t kPartialSuffix[] = L".calvex-partial";
 
 namespace {
-constexpr size_t MaxComponent = 255;
 constexpr size_t MaxPath = MAX_PATH - 1;  // characters, without the terminator
 
 bool IsSeparator(wchar_t c) { return c == L'\\' || c == L'/'; }
@@ -76,10 +75,6 @@ bool MakeSafeComponent(std::wstring& part, SafeName& result) {
     if (IsReservedDeviceName(part)) {
         Note(result, L"reserved device name prefixed");
         part.insert(0, 1, L'_');
-    }
-    if (part.size() > MaxComponent) {
-        result = Refuse(L"component longer than 255 characters");
-        return false;
     }
     return true;
 }
