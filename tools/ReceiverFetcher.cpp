@@ -85,7 +85,10 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
         hr = ReadFileContents(data, 0, &stream);
     }
     if (hr != S_OK || !stream) {
-        error = m_interrupted ? L"interrupted" : L"download failed or cancelled (" + HexText(hr) + L")";
+        // S_FALSE: the product's dialog ended without the file (failed or cancelled).
+        error = m_interrupted ? L"interrupted"
+                : hr == S_FALSE ? L"download failed or cancelled"
+                                : L"no contents (" + HexText(hr) + L")";
         return false;
     }
     return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));

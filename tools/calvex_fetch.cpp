@@ -23,6 +23,8 @@ namespace {
 const CLSID kDeviceManagerClass = {0x0FADF314, 0xB4FD, 0x413C, {0x9E, 0x26, 0x6B, 0xC4, 0x9B, 0x06, 0x60, 0x80}};
 const wchar_t* const kBrandNames[2] = {L"Calvex", L"Brennor"};
 
+const wchar_t kNoReceiver[] = L"no receiver is connected";
+
 std::atomic<bool> g_interrupted{false};
 
 struct Receiver {
@@ -115,7 +117,7 @@ std::wstring WhyNoReceivers() {
         return text;
     }
     manager->Release();
-    return L"no receiver is connected";
+    return kNoReceiver;
 }
 
 void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options, FetchConsole& console,
@@ -159,8 +161,14 @@ int Fetch(const FetchOptions& options, FetchConsole& console) {
     }
     std::wstring unknown;
     if (receivers.empty()) {
-        console.Error(WhyNoReceivers());
-        return 2;
+        const std::wstring why = WhyNoReceivers();
+        // A device manager that was quitting as the folders bound lists nothing; once started
+        // anew (by the question above) it is asked once more.
+        if (why == kNoReceiver) ListReceivers(options, receivers);
+        if (receivers.empty()) {
+            console.Error(why);
+            return 2;
+        }
     }
     if (!Select(options, receivers, unknown)) {
         console.Error(L"no such receiver: " + unknown);
