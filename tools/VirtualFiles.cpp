@@ -2,6 +2,8 @@
 
 #include <vector>
 
+#include "DescriptorName.h"
+
 namespace {
 constexpr ULONG ChunkBytes = 1 << 20;
 
@@ -75,7 +77,21 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     return hr;
 }
 
-HRESULT ReadDescriptor(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
+// The last guard: whatever the name rules let through must still resolve below the target.
+bool IsInside(const std::wstring& targetDir, const std::wstring& path) {
+    wchar_t fullTarget[MAX_PATH], fullPath[MAX_PATH];
+    if (!GetFullPathNameW(targetDir.c_str(), MAX_PATH, fullTarget, nullptr) ||
+        !GetFullPathNameW(path.c_str(), MAX_PATH, fullPath, nullptr))
+        return false;
+    std::wstring prefix = fullTarget;
+    if (prefix.empty() || prefix.back() != L'\\') prefix += L'\\';
+    return CompareStringOrdinal(fullPath, static_cast<int>(prefix.size()), prefix.c_str(), static_cast<int>(prefix.size()),
+                                TRUE) == CSTR_EQUAL;
+}
+
+}  // namespace
+
+HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
     FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILEDESCRIPTORW)), nullptr,
                         DVASPECT_CONTENT, -1, TYMED_HGLOBAL};
     STGMEDIUM medium = {};
@@ -96,8 +112,7 @@ HRESULT ReadDescriptor(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
     return hr;
 }
 
-// Through a clipboard snapshot QueryGetData with an index fails: ask GetData directly.
-HRESULT ReadContents(IDataObject* data, LONG index, IStream** stream) {
+HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream) {
     FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILECONTENTS)), nullptr,
                         DVASPECT_CONTENT, index, TYMED_ISTREAM};
     STGMEDIUM medium = {};
@@ -112,31 +127,23 @@ HRESULT ReadContents(IDataObject* data, LONG index, IStream** stream) {
     ReleaseStgMedium(&medium);
     return S_OK;
 }
-}  // namespace
-
-bool IsSafeDescriptorName(const std::wstring& name) {
-    if (name.empty() || name[0] == L'\\' || name[0] == L'/' || name.find(L':') != std::wstring::npos) return false;
-    std::vector<std::wstring> parts = Components(name);
-    if (parts.back().empty()) return false;
-    for (const std::wstring& part : parts) {
-        if (part == L"." || part == L"..") return false;
-    }
-    return true;
-}
-
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
                          std::wstring& error) {
-    const std::wstring name = descriptor.cFileName;
-    if (!IsSafeDescriptorName(name)) {
-        error = L"refused name \"" + name + L"\"";
+    const SafeName safe = MakeSafeDescriptorName(descriptor.cFileName, targetDir.size());
+    if (safe.refused) {
+        error = L"refused name: " + safe.reason;
         return E_ACCESSDENIED;
     }
-    if (!MakeParentFolders(targetDir, name)) {
+    const std::wstring path = targetDir + L"\\" + safe.name;
+    if (!IsInside(targetDir, path)) {
+        error = L"refused name: outside the target folder";
+        return E_ACCESSDENIED;
+    }
+    if (!MakeParentFolders(targetDir, safe.name)) {
         error = ErrorText(L"cannot create the folders", GetLastError());
         return HRESULT_FROM_WIN32(GetLastError());
     }
-    const std::wstring path = targetDir + L"\\" + name;
-    const std::wstring temporary = path + L".calvex-partial";
+    const std::wstring temporary = path + kPartialSuffix;
     HRESULT hr = WriteTemporary(temporary, descriptor, stream, error);
     if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
@@ -149,7 +156,7 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
 int PasteVirtualFiles(IDataObject* data, const std::wstring& targetDir, const PasteReport& report, int& failed) {
     failed = 0;
     std::vector<FILEDESCRIPTORW> files;
-    HRESULT hr = ReadDescriptor(data, files);
+    HRESULT hr = ReadFileDescriptors(data, files);
     if (FAILED(hr)) {
         report(ErrorText(L"no file descriptor", static_cast<DWORD>(hr)));
         failed = 1;
@@ -159,17 +166,18 @@ int PasteVirtualFiles(IDataObject* data, const std::wstring& targetDir, const Pa
     for (size_t i = 0; i < files.size(); ++i) {
         std::wstring error;
         IStream* stream = nullptr;
-        hr = IsSafeDescriptorName(files[i].cFileName) ? ReadContents(data, static_cast<LONG>(i), &stream)
-                                                       : E_ACCESSDENIED;
+        const SafeName safe = MakeSafeDescriptorName(files[i].cFileName, targetDir.size());
+        hr = safe.refused ? E_ACCESSDENIED : ReadFileContents(data, static_cast<LONG>(i), &stream);
         if (hr == S_OK) {
             hr = WriteVirtualFile(targetDir, files[i], stream, error);
             stream->Release();
         } else {
-            error = hr == E_ACCESSDENIED ? L"refused name" : ErrorText(L"no contents", static_cast<DWORD>(hr));
+            error = hr == E_ACCESSDENIED ? L"refused name: " + safe.reason : ErrorText(L"no contents", static_cast<DWORD>(hr));
         }
         if (hr == S_OK) {
             ++written;
-            report(L"copied " + std::wstring(files[i].cFileName));
+            report(L"copied " + std::wstring(files[i].cFileName) +
+                   (safe.reason.empty() ? L"" : L" as " + safe.name + L" (" + safe.reason + L")"));
         } else {
             ++failed;
             report(L"failed " + std::wstring(files[i].cFileName) + L": " + error);

@@ -7,12 +7,16 @@
 
 #include <functional>
 #include <string>
+#include <vector>
 
-// A descriptor name that stays inside the target: relative, no drive, no "." or ".."
-// component, not empty.
-bool IsSafeDescriptorName(const std::wstring& name);
+// The data object's "FileGroupDescriptorW", one record per file.
+HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files);
+// One file's "FileContents" as a stream (S_FALSE when the data object gives none). Asked of
+// GetData directly: through a clipboard snapshot QueryGetData with an index fails.
+HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream);
 
-// Writes the stream's remaining bytes as target\name: to a temporary name first, then the
+// Writes the stream's remaining bytes as target\name, the name made safe or refused by
+// MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the
 // size is checked against the descriptor and the write time set, then it is renamed. Nothing
 // is left behind on failure; error says why.
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,

@@ -1,0 +1,18 @@
+#pragma once
+// The command line of calvex-fetch.
+#include <string>
+#include <vector>
+
+struct FetchOptions {
+    bool calvex = true;    // which brand folders are walked
+    bool brennor = true;
+    std::vector<std::wstring> receivers;  // keys or display names; empty: every receiver
+    bool all = false;      // fetch again what is already there
+    bool dryRun = false;
+    std::wstring target;   // as given; made absolute by the caller
+};
+
+extern const wchar_t kFetchUsage[];
+
+// The arguments after the program's name. False with the reason on bad usage.
+bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions& options, std::wstring& error);

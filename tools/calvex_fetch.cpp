@@ -1,0 +1,210 @@
+// calvex-fetch: every new file of every receiver into a project folder, through the same shell
+// namespace that the user browses (see the README for the options and an example run).
+//
+// Exit code: 0 all good, 1 some files failed, 2 nothing could be done (no device manager, no
+// such receiver, target not writable, bad arguments).
+#include <windows.h>
+#include <ole2.h>
+
+#include <atomic>
+#include <string>
+#include <vector>
+
+#include "DescriptorName.h"
+#include "DownloadDialogWatch.h"
+#include "FetchConsole.h"
+#include "FetchOptions.h"
+#include "MessageBoxAnswerer.h"
+#include "ReceiverFetcher.h"
+#include "ShellNamespace.h"
+
+namespace {
+// The device manager's class, asked for only to say why no receiver was listed.
+const CLSID kDeviceManagerClass = {0x0FADF314, 0xB4FD, 0x413C, {0x9E, 0x26, 0x6B, 0xC4, 0x9B, 0x06, 0x60, 0x80}};
+const wchar_t* const kBrandNames[2] = {L"Calvex", L"Brennor"};
+
+const wchar_t kNoReceiver[] = L"no receiver is connected";
+
+std::atomic<bool> g_interrupted{false};
+
+struct Receiver {
+    std::wstring brand;
+    std::wstring display;  // model "@" port, as Explorer shows it
+    std::wstring key;      // the parsing name: serial "!" model "!" port
+    ComPtr<IShellFolder> parent;
+    OwnedItem item;
+};
+
+// Ctrl+C cancels the running download through its dialog, as the user would; no file that
+// looks complete is left, and the summary is still printed.
+BOOL WINAPI OnConsoleControl(DWORD event) {
+    if (event != CTRL_C_EVENT && event != CTRL_BREAK_EVENT) return FALSE;
+    g_interrupted = true;
+    DownloadDialogWatch::CancelRunningDialog();
+    return TRUE;
+}
+
+std::wstring FullPath(const std::wstring& path) {
+    wchar_t full[MAX_PATH];
+    const DWORD length = GetFullPathNameW(path.c_str(), MAX_PATH, full, nullptr);
+    std::wstring result = length && length < MAX_PATH ? full : path;
+    while (result.size() > 3 && (result.back() == L'\\' || result.back() == L'/')) result.pop_back();
+    return result;
+}
+
+// The target exists (made if need be) and takes a new file.
+bool IsWritableFolder(const std::wstring& target) {
+    CreateDirectoryW(target.c_str(), nullptr);
+    const std::wstring probe = target + L"\\.calvex-fetch-probe";
+    HANDLE file = CreateFileW(probe.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS,
+                              FILE_ATTRIBUTE_TEMPORARY | FILE_FLAG_DELETE_ON_CLOSE, nullptr);
+    if (file == INVALID_HANDLE_VALUE) return false;
+    CloseHandle(file);
+    return true;
+}
+
+HRESULT ListReceivers(const FetchOptions& options, std::vector<Receiver>& receivers) {
+    const bool wanted[2] = {options.calvex, options.brennor};
+    for (int brand = 0; brand < 2; ++brand) {
+        if (!wanted[brand]) continue;
+        ComPtr<IShellFolder> folder;
+        const HRESULT hr = BindShellPath(kBrandFolderPaths[brand], folder);
+        if (FAILED(hr)) return hr;
+        for (OwnedItem& item : ShellChildren(folder.Get(), SHCONTF_FOLDERS)) {
+            Receiver receiver{kBrandNames[brand], ShellName(folder.Get(), item.get(), SHGDN_NORMAL),
+                              ShellName(folder.Get(), item.get(), SHGDN_INFOLDER | SHGDN_FORPARSING), folder,
+                              std::move(item)};
+            receivers.push_back(std::move(receiver));
+        }
+    }
+    return S_OK;
+}
+
+bool Matches(const Receiver& receiver, const std::wstring& wanted) {
+    return lstrcmpiW(receiver.key.c_str(), wanted.c_str()) == 0 || lstrcmpiW(receiver.display.c_str(), wanted.c_str()) == 0;
+}
+
+// The receivers that the options name, in listing order; false with the first unknown name.
+bool Select(const FetchOptions& options, std::vector<Receiver>& receivers, std::wstring& unknown) {
+    for (const std::wstring& wanted : options.receivers) {
+        bool found = false;
+        for (const Receiver& receiver : receivers) found = found || Matches(receiver, wanted);
+        if (found) continue;
+        unknown = wanted;
+        return false;
+    }
+    if (options.receivers.empty()) return true;
+    std::vector<Receiver> chosen;
+    for (Receiver& receiver : receivers) {
+        for (const std::wstring& wanted : options.receivers) {
+            if (!Matches(receiver, wanted)) continue;
+            chosen.push_back(std::move(receiver));
+            break;
+        }
+    }
+    receivers.swap(chosen);
+    return true;
+}
+
+// Why nothing was listed: the device manager cannot be reached, or no receiver is connected.
+std::wstring WhyNoReceivers() {
+    IUnknown* manager = nullptr;
+    const HRESULT hr = CoCreateInstance(kDeviceManagerClass, nullptr, CLSCTX_LOCAL_SERVER, IID_IUnknown,
+                                        reinterpret_cast<void**>(&manager));
+    if (FAILED(hr)) {
+        wchar_t text[96];
+        swprintf(text, 96, L"no device manager: it cannot be started (0x%08X)", static_cast<unsigned>(hr));
+        return text;
+    }
+    manager->Release();
+    return kNoReceiver;
+}
+
+void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options, FetchConsole& console,
+                   FetchTotals& totals) {
+    const SafeName folder = MakeSafeFolderName(receiver.display, target.size());
+    std::wstring header = receiver.brand + L" " + receiver.display + L" (" + receiver.key + L")";
+    if (folder.refused) {
+        ++totals.failed;
+        return console.Line(header + L": FAILED, no folder name: " + folder.reason);
+    }
+    console.Line(header + L" -> " + target + L"\\" + folder.name);
+    ComPtr<IShellFolder> files;
+    HRESULT hr = receiver.parent->BindToObject(receiver.item.get(), nullptr, IID_IShellFolder, files.PutVoid());
+    if (FAILED(hr)) {
+        ++totals.failed;
+        return console.Line(L"  FAILED      the receiver cannot be opened");
+    }
+    ReceiverFetcher(options, console, totals, g_interrupted).Run(files.Get(), target + L"\\" + folder.name);
+}
+
+std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULONGLONG milliseconds) {
+    wchar_t seconds[32];
+    swprintf(seconds, 32, L"%.1f s", milliseconds / 1000.0);
+    return std::wstring(options.dryRun ? L"dry run: " : L"") + std::to_wstring(totals.fetched) +
+           (options.dryRun ? L" to fetch, " : L" fetched, ") + std::to_wstring(totals.skipped) + L" skipped, " +
+           std::to_wstring(totals.failed) + L" failed, " + ByteText(totals.bytes) + L" in " + seconds +
+           (g_interrupted ? L" (interrupted)" : L"");
+}
+
+int Fetch(const FetchOptions& options, FetchConsole& console) {
+    const std::wstring target = FullPath(options.target);
+    if (!options.dryRun && !IsWritableFolder(target)) {
+        console.Error(L"target not writable: " + target);
+        return 2;
+    }
+    std::vector<Receiver> receivers;
+    const HRESULT hr = ListReceivers(options, receivers);
+    if (FAILED(hr)) {
+        console.Error(L"the receivers folders cannot be opened: is the extension registered?");
+        return 2;
+    }
+    std::wstring unknown;
+    if (receivers.empty()) {
+        const std::wstring why = WhyNoReceivers();
+        // A device manager that was quitting as the folders bound lists nothing; once started
+        // anew (by the question above) it is asked once more.
+        if (why == kNoReceiver) ListReceivers(options, receivers);
+        if (receivers.empty()) {
+            console.Error(why);
+            return 2;
+        }
+    }
+    if (!Select(options, receivers, unknown)) {
+        console.Error(L"no such receiver: " + unknown);
+        return 2;
+    }
+    const ULONGLONG started = GetTickCount64();
+    FetchTotals totals;
+    for (Receiver& receiver : receivers) {
+        if (g_interrupted) break;
+        FetchReceiver(receiver, target, options, console, totals);
+    }
+    console.Line(Summary(options, totals, GetTickCount64() - started));
+    return totals.failed || g_interrupted ? 1 : 0;
+}
+}  // namespace
+
+int wmain(int argc, wchar_t** argv) {
+    FetchConsole console;
+    FetchOptions options;
+    std::wstring error;
+    if (!ParseFetchOptions(std::vector<std::wstring>(argv + 1, argv + argc), options, error)) {
+        console.Error(error);
+        console.Line(kFetchUsage);
+        return 2;
+    }
+    if (FAILED(OleInitialize(nullptr))) return 2;
+    SetConsoleCtrlHandler(OnConsoleControl, TRUE);
+    int result;
+    {
+        MessageBoxAnswerer answerer([&](const std::wstring& title, const std::wstring& text) {
+            std::wstring flat = text;
+            for (wchar_t& c : flat) if (c == L'\r' || c == L'\n') c = L' ';
+            console.Line(L"  message box: " + title + L": " + flat);
+        });
+        result = Fetch(options, console);
+    }
+    OleUninitialize();
+    return result;
+}
