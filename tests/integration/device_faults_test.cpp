@@ -134,11 +134,15 @@ protected:
         answerer.reset();
         scope.reset();
     }
-    // Receiver "Calvex A" (1000-0001 on USB) with LOG0001..LOG0004, 1000 bytes each.
-    void MakeReceiver(ReceiverTree& tree, ReceiverSetup setup) {
+    // Receiver "Calvex A" (1000-0001 on USB) with LOG0001, LOG0002, ..., 1000 bytes each.
+    void MakeReceiver(ReceiverTree& tree, ReceiverSetup setup, int files = 4) {
         setup.folder = L"Calvex A";
         tree.AddReceiver(setup);
-        for (const wchar_t* name : {L"LOG0001", L"LOG0002", L"LOG0003", L"LOG0004"}) tree.AddFile(L"Calvex A", name, 1000);
+        for (int i = 1; i <= files; ++i) {
+            wchar_t name[16];
+            swprintf(name, 16, L"LOG%04d", i);
+            tree.AddFile(L"Calvex A", name, 1000);
+        }
         scope.reset();  // the old scope's end restores the defaults: before the new one begins
         scope.reset(new DeviceSimScope(tree.Root()));
     }
@@ -157,9 +161,11 @@ TEST_F(DeviceFaultsTest, EveryFaultEndsInTimeWithTheRightOutcome) {
         int items, written, failed, boxes;
         DWORD maxMs;
         std::wstring serial = L"1000-0001";
+        int files = 4;
     } rows[] = {
         {"killed while listing receivers", {L"[Exit]", L"IReceiver.get_Label=1"}, ListReceivers, S_OK, 0, 0, 0, 0, 10000},
         {"killed while listing files", {L"[Exit]", L"IFilesColl.get_Item:LOG0003=1"}, ListFiles, S_OK, 2, 0, 0, 0, 10000},
+        {"killed early in a long listing", {L"[Exit]", L"IFilesColl.get_Item:LOG0002=1"}, ListFiles, S_OK, 1, 0, 0, 0, 10000, L"1000-0001", 400},
         {"killed while downloading", {L"[Transfer]", L"Rate=5000", L"ExitAtPercent=30"}, DownloadFirst, S_OK, 4, 0, 1, 1, 30000},
         {"killed while deleting", {L"[Exit]", L"IReceiverFile.Delete=1"}, DeleteFirst, S_OK, 0, 0, 0, 1, 20000},
         {"negative size", {L"[Report]", L"Size=-5"}, DownloadFirst, S_OK, 4, 0, 1, 0, 20000},
@@ -179,7 +185,7 @@ TEST_F(DeviceFaultsTest, EveryFaultEndsInTimeWithTheRightOutcome) {
             setup.model.clear();
             setup.portType = 1;
         }
-        MakeReceiver(tree, setup);
+        MakeReceiver(tree, setup, row.files);
         boxes = 0;
         Outcome out;
         const std::wstring dir = target.Path();
