@@ -20,6 +20,8 @@ bool ReceiverDescription::Parse(const IniText& ini, std::wstring* error) {
         {L"Transfer", &ReceiverDescription::ParseTransfer},
         {L"Fail", &ReceiverDescription::ParseFail},
         {L"Times", &ReceiverDescription::ParseTimes},
+        {L"Exit", &ReceiverDescription::ParseExit},
+        {L"Report", &ReceiverDescription::ParseReport},
     };
     if (!ini.Find(L"Receiver")) {
         *error = L"no [Receiver] section";
@@ -93,6 +95,46 @@ bool ReceiverDescription::ParseFail(const IniText::Section& section, std::wstrin
                                                                        std::wstring* reason) {
         return faults.SetCallFailure(entry.key, static_cast<HRESULT>(value), reason);
     });
+}
+
+bool ReceiverDescription::ParseExit(const IniText::Section& section, std::wstring* error) {
+    return ParseNumbers(section, L"is not a number", error, [this](const IniText::Entry& entry, long value,
+                                                                   std::wstring* reason) {
+        return value == 0 || faults.SetExitCall(entry.key, reason);
+    });
+}
+
+bool ReceiverDescription::ParseReport(const IniText::Section& section, std::wstring* error) {
+    for (const IniText::Entry& entry : section.entries) {
+        const wchar_t* end = nullptr;
+        bool read = false;
+        if (SameTextNoCase(entry.key, L"Time")) {
+            // Any double, NaN and infinities included: a time that is no date is the point.
+            wchar_t* stop = nullptr;
+            report.time = wcstod(entry.value.c_str(), &stop);
+            end = stop;
+            read = report.timeSet = stop != entry.value.c_str();
+        } else if (SameTextNoCase(entry.key, L"Size")) {
+            read = report.sizeSet = ParseInteger32(entry.value, &report.size);
+        } else if (SameTextNoCase(entry.key, L"NameLength")) {
+            read = ParseInteger32(entry.value, &report.nameLength) && report.nameLength >= 0 &&
+                   report.nameLength <= 4096;
+        } else {
+            *error = EntryError(entry, L"is not a report key");
+            return false;
+        }
+        if (!read || (end && *end)) {
+            *error = EntryError(entry, L"does not read");
+            return false;
+        }
+    }
+    return true;
+}
+
+void ReceiverDescription::ApplyReport(std::wstring* name, long* size, DATE* time) const {
+    if (report.sizeSet) *size = report.size;
+    if (report.timeSet) *time = report.time;
+    if (name->size() < static_cast<size_t>(report.nameLength)) name->resize(report.nameLength, L'_');
 }
 
 bool ReceiverDescription::ParseNumbers(const IniText::Section& section, const wchar_t* notANumber,

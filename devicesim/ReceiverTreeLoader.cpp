@@ -114,6 +114,7 @@ bool ReceiverTreeLoader::ListFiles(const std::wstring& folderPath, const Receive
         ULONGLONG size = (static_cast<ULONGLONG>(data.nFileSizeHigh) << 32) | data.nFileSizeLow;
         file->size = static_cast<long>(std::min<ULONGLONG>(size, 0x7FFFFFFF));
         if (!description.FindTime(file->name, &file->time)) file->time = LocalOleDate(data.ftLastWriteTime);
+        description.ApplyReport(&file->name, &file->size, &file->time);
         files->push_back(file);
     });
     if (error != ERROR_SUCCESS) {

@@ -40,6 +40,7 @@ bool SimDownload::Next(ULONGLONG now, Event* event) {
         *event = Event{Step::Begin, 0, S_OK};
         return true;
     }
+    if (m_disconnected) return End(HRESULT_FROM_WIN32(ERROR_DEVICE_NOT_CONNECTED), event);
     if (m_cancelled) return End(HRESULT_FROM_WIN32(ERROR_CANCELLED), event);
     // The faults strike before the progress of their percent is reported.
     if (m_plan.exitAtPercent >= 0 && Percent() >= m_plan.exitAtPercent) {

@@ -25,6 +25,8 @@ public:
     // download has ended. Finish is the last event; Exit asks to end the process here.
     bool Next(ULONGLONG now, Event* event);
     void Cancel() { m_cancelled = true; }
+    // The receiver went away: the download ends with ERROR_DEVICE_NOT_CONNECTED at the next step.
+    void Disconnect() { m_disconnected = true; }
     // Goes on after an Exit that was not acted out.
     void SkipExit() { m_plan.exitAtPercent = -1; }
     bool Ended() const { return m_ended; }
@@ -42,5 +44,6 @@ private:
     ULONGLONG m_start = 0;
     bool m_begun = false;
     bool m_cancelled = false;
+    bool m_disconnected = false;
     bool m_ended = false;
 };

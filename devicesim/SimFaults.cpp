@@ -36,6 +36,19 @@ long Pick(const Setting& mine, const Setting& global, long fallback) {
 }  // namespace
 
 bool SimFaults::SetCallFailure(const std::wstring& name, HRESULT result, std::wstring* error) {
+    return AddCall(m_calls, name, result, error);
+}
+
+bool SimFaults::SetExitCall(const std::wstring& name, std::wstring* error) {
+    return AddCall(m_exits, name, S_OK, error);
+}
+
+bool SimFaults::ExitsOn(const wchar_t* call, const std::wstring& target) const {
+    HRESULT unused = S_OK;
+    return Find(m_exits, call, target, &unused);
+}
+
+bool SimFaults::AddCall(CallMap& calls, const std::wstring& name, HRESULT result, std::wstring* error) {
     size_t colon = name.find(L':');
     const wchar_t* call = CanonicalCall(name.substr(0, colon));
     if (!call) {
@@ -44,7 +57,7 @@ bool SimFaults::SetCallFailure(const std::wstring& name, HRESULT result, std::ws
     }
     std::wstring target = colon == std::wstring::npos ? std::wstring() : name.substr(colon + 1);
     // Targets compare without regard to case, as file names do.
-    m_calls[Key(call, target)] = result;
+    calls[Key(call, target)] = result;
     return true;
 }
 
@@ -74,17 +87,21 @@ bool SimFaults::SetTransfer(const std::wstring& key, long value, std::wstring* e
 }
 
 bool SimFaults::FindCall(const wchar_t* call, const std::wstring& target, HRESULT* result) const {
-    if (m_calls.empty()) return false;
+    return Find(m_calls, call, target, result);
+}
+
+bool SimFaults::Find(const CallMap& calls, const wchar_t* call, const std::wstring& target, HRESULT* result) {
+    if (calls.empty()) return false;
     if (!target.empty()) {
-        for (const auto& entry : m_calls) {
+        for (const auto& entry : calls) {
             if (SameTextNoCase(entry.first, Key(call, target))) {
                 *result = entry.second;
                 return true;
             }
         }
     }
-    auto found = m_calls.find(call);
-    if (found == m_calls.end()) return false;
+    auto found = calls.find(call);
+    if (found == calls.end()) return false;
     *result = found->second;
     return true;
 }

@@ -20,6 +20,9 @@ public:
     // Call names are "Interface.method" as the contract spells them, "IReceiver.get_Label";
     // a file-level call may name one file after a colon: "IFilesColl.get_Item:LOG0002".
     bool SetCallFailure(const std::wstring& name, HRESULT result, std::wstring* error);
+    // The server ends itself (as ExitAtPercent does) when this call is made; named as above.
+    bool SetExitCall(const std::wstring& name, std::wstring* error);
+    bool ExitsOn(const wchar_t* call, const std::wstring& target) const;
     // One key of the transfer settings (Rate, FailAtPercent, FailResult, ExitAtPercent).
     bool SetTransfer(const std::wstring& key, long value, std::wstring* error);
 
@@ -33,6 +36,10 @@ private:
         bool set = false;
         long value = 0;
     };
-    std::map<std::wstring, HRESULT> m_calls;  // keys canonical: the known name, then ":target"
+    using CallMap = std::map<std::wstring, HRESULT>;  // keys canonical: the known name, then ":target"
+    static bool AddCall(CallMap& calls, const std::wstring& name, HRESULT result, std::wstring* error);
+    static bool Find(const CallMap& calls, const wchar_t* call, const std::wstring& target, HRESULT* result);
+    CallMap m_calls;
+    CallMap m_exits;
     Setting m_rate, m_failAtPercent, m_failResult, m_exitAtPercent;
 };

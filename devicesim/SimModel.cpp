@@ -227,6 +227,8 @@ void SimModel::RemoveListener(SimTreeListener* listener) {
 
 HRESULT SimModel::CallFault(const wchar_t* call, const SimReceiverRecord* receiver, const std::wstring& target) const {
     ++m_callCounts[call];
+    if (receiver && receiver->description.faults.ExitsOn(call, target))
+        AbruptExit(std::wstring(call) + (target.empty() ? L"" : L" on \"" + target + L"\""));
     HRESULT result = S_OK;
     if (!(receiver && receiver->description.faults.FindCall(call, target, &result)) &&
         !m_globalFaults.FindCall(call, target, &result))

@@ -107,6 +107,7 @@ STDMETHODIMP SimReceiverFile::Cancel() {
 bool SimReceiverFile::Tick() {
     ComPtr<IReceiverFile> self(this);  // a handler may release the client's last reference
     SimDownload::Event event;
+    if (m_download && !m_receiver->online) m_download->Disconnect();  // unplugged mid-download
     while (m_download && m_download->Next(GetTickCount64(), &event)) {
         if (event.step == SimDownload::Step::Exit) {
             if (!m_model->AbruptExit(L"download of \"" + m_file->path + L"\" at " + std::to_wstring(event.percent) + L"%"))

@@ -59,6 +59,9 @@ const Row kRows[] = {
     {"v time", kMinimal + "[Times]\nLOG0001=2026-11-03 24:00:00\n",
      L"receiver.ini line 7: LOG0001 is not a time (YYYY-MM-DD HH:MM:SS)"},
     {"w garbage", std::string("\x00\x01\x02[", 4), L"receiver.ini line 1: expected key=value"},
+    {"x exit call", kMinimal + "[Exit]\nIReceiver.Explode=1\n", L"receiver.ini line 7: unknown call \"IReceiver.Explode\""},
+    {"y report key", kMinimal + "[Report]\nColour=1\n", L"receiver.ini line 7: Colour is not a report key"},
+    {"z report time", kMinimal + "[Report]\nTime=1e5x\n", L"receiver.ini line 7: Time does not read"},
 };
 
 std::wstring Outcome(const SimTreeScan& scan, const std::wstring& folder) {

@@ -1,0 +1,160 @@
+// Guards large receivers: a burst of file events that floods Explorer with notifications or view re-fills, and 2,000 files listed, sorted or copied wrongly.
+#include <windows.h>
+#include <shlobj.h>
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "VirtualFiles.h"
+#include "items/CCalvexReceiversNotifyWindow.h"
+#include "items/CReceiversPidlMgr.h"
+#include "module/ModuleApp.h"
+#include "support/DeviceSim.h"
+#include "support/TestSupport.h"
+#include "support/ViewHost.h"
+
+using namespace testsupport;
+
+namespace {
+std::map<std::wstring, int> g_notified;  // SHChangeNotify calls per path
+
+void WINAPI CountNotify(LONG, UINT, LPCVOID item1, LPCVOID) { ++g_notified[static_cast<const wchar_t*>(item1)]; }
+
+size_t CountTrace(const std::string& line) {
+    size_t count = 0;
+    for (const std::string& message : TraceMessages()) count += message == line;
+    return count;
+}
+
+const int kFiles = 2000;
+// Sizes and minutes in orders of their own, so that each column sorts apart from the names.
+int SizeOf(int i) { return i * 7919 % 5003; }
+int MinuteOf(int i) { return i * 613 % kFiles; }  // distinct: 613 and 2000 share no factor
+int IndexOf(int i) { return i; }
+
+std::wstring FileName(int i) {
+    wchar_t name[16];
+    swprintf(name, 16, L"F%04d", i);
+    return name;
+}
+
+class ReceiverLoadTest : public testing::Test {
+protected:
+    static void SetUpTestSuite() { ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized()); }
+    void SetUp() override {
+        g_notified.clear();
+        CCalvexReceiversNotifyWindow::SetChangeNotify(CountNotify);
+    }
+    void TearDown() override {
+        scope.reset();
+        CCalvexReceiversNotifyWindow::DestroyInstance();
+        CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
+    }
+    ReceiverTree tree;
+    std::unique_ptr<DeviceSimScope> scope;
+};
+}  // namespace
+
+TEST_F(ReceiverLoadTest, BurstOfAThousandFileEventsGivesOneNotificationAndFewRefills) {
+    ReceiverSetup setup;
+    setup.folder = L"Calvex A";
+    tree.AddReceiver(setup);
+    tree.AddFile(L"Calvex A", L"LOG0001", 10);
+    scope.reset(new DeviceSimScope(tree.Root()));
+    ComPtr<IShellFolder> receiver = OurFolder(true);
+    ASSERT_TRUE(receiver);
+    TestBrowser browser(false);
+    HostedView view(receiver, browser);
+    ASSERT_EQ(1, view.Count());
+    const std::string fill = "CCalvexReceiversShellView::FillList\n";
+    const size_t fillsBefore = CountTrace(fill);
+
+    // Written beside the tree first, then moved in: moves are quick enough for a burst.
+    TempDirectory staging(L"calvex-burst");
+    for (int i = 0; i < 1000; ++i) {
+        HANDLE file = CreateFileW((staging.Path() + L"\\" + FileName(i)).c_str(), GENERIC_WRITE, 0, nullptr,
+                                  CREATE_ALWAYS, 0, nullptr);
+        ASSERT_NE(INVALID_HANDLE_VALUE, file);
+        CloseHandle(file);
+    }
+    const DWORD started = GetTickCount();
+    for (int i = 0; i < 1000; ++i)
+        ASSERT_TRUE(MoveFileW((staging.Path() + L"\\" + FileName(i)).c_str(), (tree.FolderPath(L"Calvex A") + L"\\" + FileName(i)).c_str()));
+    // Under a second on an idle machine; Wine's file calls on a busy one stretch it a little,
+    // which only makes coalescing harder: every event still comes well within the quiet period.
+    ASSERT_LT(GetTickCount() - started, 3000u) << "no burst";
+    // The events, the one-second quiet period, the five-second view timer, and some slack.
+    ASSERT_TRUE(PumpUntil([&] { return view.Count() == 1001; }, 60000)) << view.Count();
+    PumpMessagesFor(8000);
+
+    const std::wstring path =
+        L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}\\1000-0001!Q9 GNSS!USB";
+    EXPECT_GE(CountTrace("CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n"), 1000u) << "every event arrived";
+    EXPECT_EQ((std::map<std::wstring, int>{{path, 1}}), g_notified);
+    const size_t fills = CountTrace(fill) - fillsBefore;
+    EXPECT_GE(fills, 1u);
+    EXPECT_LE(fills, 2u);
+}
+
+TEST_F(ReceiverLoadTest, TwoThousandFilesListSortAndCopy) {
+    ReceiverSetup setup;
+    setup.folder = L"Calvex A";
+    setup.extraLines.push_back(L"[Times]");
+    for (int i = 0; i < kFiles; ++i) {
+        wchar_t line[64];
+        const int minutes = MinuteOf(i);
+        swprintf(line, 64, L"%ls=2026-01-%02d %02d:%02d:00", FileName(i).c_str(), 1 + minutes / 1440,
+                 minutes / 60 % 24, minutes % 60);
+        setup.extraLines.push_back(line);
+    }
+    tree.AddReceiver(setup);
+    for (int i = 0; i < kFiles; ++i) tree.AddFile(L"Calvex A", FileName(i), static_cast<size_t>(SizeOf(i)));
+    scope.reset(new DeviceSimScope(tree.Root()));
+    ComPtr<IShellFolder> receiver = OurFolder(true);
+    ASSERT_TRUE(receiver);
+    std::vector<TaskPidl> items = ListItems(receiver.Get(), SHCONTF_NONFOLDERS);
+    ASSERT_EQ(static_cast<size_t>(kFiles), items.size());
+
+    const struct {
+        int column;
+        int (*key)(int);  // by the file's index, from the tree's own data
+    } columns[] = {{0, IndexOf}, {2, SizeOf}, {3, MinuteOf}, {-2, [](int i) { return -SizeOf(i); }}};
+    CReceiversPidlMgr mgr;
+    auto indexOf = [&](LPCITEMIDLIST item) { return _wtoi(mgr.GetItemName(item).c_str() + 1); };
+    for (const auto& c : columns) {
+        SCOPED_TRACE(c.column);
+        std::vector<LPCITEMIDLIST> order;
+        for (const TaskPidl& item : items) order.push_back(item.get());
+        // The view reads the sign of the raw value as the order.
+        std::stable_sort(order.begin(), order.end(), [&](LPCITEMIDLIST a, LPCITEMIDLIST b) {
+            return static_cast<int>(receiver->CompareIDs(c.column, a, b)) < 0;
+        });
+        int wrong = 0;
+        for (size_t i = 1; i < order.size(); ++i) wrong += c.key(indexOf(order[i - 1])) > c.key(indexOf(order[i]));
+        EXPECT_EQ(0, wrong);
+    }
+
+    // A few copied out, byte for byte.
+    TempDirectory target(L"calvex-load-target");
+    const int picks[] = {0, 1234, kFiles - 1};
+    ComPtr<IDataObject> data;
+    LPCITEMIDLIST chosen[3];
+    for (int k = 0; k < 3; ++k)
+        for (const TaskPidl& item : items)
+            if (indexOf(item.get()) == picks[k]) chosen[k] = item.get();
+    for (int k = 0; k < 3; ++k) {
+        SCOPED_TRACE(picks[k]);
+        data.Reset();
+        ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, &chosen[k], IID_IDataObject, nullptr, data.PutVoid()));
+        int failed = 0;
+        EXPECT_EQ(1, PasteVirtualFiles(data.Get(), target.Path(), [](const std::wstring&) {}, failed));
+        const std::wstring name = FileName(picks[k]);
+        EXPECT_TRUE(ReadFileBytes(target.Path() + L"\\" + name + L".qpr") ==
+                    ReadFileBytes(tree.FolderPath(L"Calvex A") + L"\\" + name));
+    }
+}
