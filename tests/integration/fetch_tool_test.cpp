@@ -89,7 +89,7 @@ protected:
 // The sample receivers twice, then once more after one file appeared on a device.
 TEST_F(FetchToolTest, FetchesWhatIsNewAndOnlyThat) {
     TempDirectory device(L"calvex-fetch-device");
-    CopyTree(SampleReceiversDir(), device.Path());
+    CopyTree(SourceDir() + L"\\sample-receivers", device.Path());
     DeviceSimScope scope(device.Path());
 
     const FetchRun first = RunFetch(Quoted(target.Path()));

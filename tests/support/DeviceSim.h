@@ -44,6 +44,8 @@ public:
     bool RemoveFile(const std::wstring& folder, const std::wstring& name) {
         return DeleteFileW((FolderPath(folder) + L"\\" + name).c_str()) != FALSE;
     }
+    // Unplugs the receiver: its folder goes with its files.
+    bool RemoveReceiver(const std::wstring& folder) { return DeleteTree(FolderPath(folder)); }
 
 private:
     TempDirectory m_dir;
