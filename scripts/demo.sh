@@ -30,7 +30,7 @@ fi
 [ -f "$build/CalvexReceiversShellExt.msi" ] || { echo "no MSI in $build: is wixl installed?" >&2; exit 1; }
 
 walk=("$here/scripts/explorer-walk.sh" "$build" --install msi --prefix "$build/demo-prefix"
-      --shots "$build/shots" --rate 524288 --report "$build/demo-report.txt")
+      --shots "$build/shots" --rate 524288 --report "$build/demo-report.txt" --brands calvex)
 echo "== Installing the MSI into a fresh Wine prefix and walking Wine's Explorer"
 status=0
 if [ -n "$show" ] && [ -n "${DISPLAY:-}" ]; then

@@ -14,9 +14,10 @@
 #   --rate BYTES                 the simulator's download rate while copying, so that the
 #                                progress dialog stays up for its screenshot
 #   --report FILE                the walk's report: screenshots and each file copied
+#   --brands "calvex brennor"    the brand folders to walk (default both)
 set -u
 build=$1; shift
-install=none prefix="" shots=$build/shots rate="" report=/dev/null
+install=none prefix="" shots=$build/shots rate="" report=/dev/null brands="calvex brennor"
 while [ $# -gt 0 ]; do
   case $1 in
     --install) install=$2 ;;
@@ -24,6 +25,7 @@ while [ $# -gt 0 ]; do
     --shots) shots=$2 ;;
     --rate) rate=$2 ;;
     --report) report=$2 ;;
+    --brands) brands=$2 ;;
     *) echo "unknown option $1" >&2; exit 2 ;;
   esac
   shift 2
@@ -210,10 +212,14 @@ copy_all() {
 click_list 400 300
 open_item "My"
 sleep 2
-copy_from="$samples/Calvex Q9 USB" widen=1
-walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
-copy_from="" widen=""
-walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
+if [[ " $brands " == *" calvex "* ]]; then
+  copy_from="$samples/Calvex Q9 USB" widen=1
+  walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
+fi
+if [[ " $brands " == *" brennor "* ]]; then
+  copy_from="" widen=""
+  walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
+fi
 
 [ -n "$rate" ] && "$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Rate /f >/dev/null 2>&1
 [ $fail -eq 0 ] || { echo "--- the namespace"; echo "$tree"; echo "--- the last view"; echo "$view"; }
