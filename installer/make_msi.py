@@ -16,7 +16,11 @@ import sys
 # Action types as wixl writes an executable installed with the product, and what an entry of
 # a DLL installed with the product is (the flags above the low six bits are kept).
 EXE_FILE, DLL_FILE, SOURCE_TYPE_BITS = 18, 17, 0x3F
-DLL_ACTIONS = ("RegisterShellExtension", "UnregisterShellExtension")
+IN_SCRIPT, ROLLBACK = 0x400, 0x100
+DLL_ACTIONS = ("RegisterShellExtension", "UnregisterShellExtension", "RollBackShellExtension")
+# wixl 0.101 writes Execute="rollback" without its in-script bits, which would make an
+# immediate action of it: the removal would run during every install.
+ROLLBACK_ACTIONS = ("RollBackShellExtension", "RollBackDeviceSim")
 
 
 def file_version(path):
@@ -82,17 +86,23 @@ def stage(work, dll, sim, samples):
         os.symlink(os.path.abspath(target), os.path.join(work, name))
 
 
-def make_dll_actions(msi):
-    """Turns the module's register and unregister actions into calls of the DLL's entries."""
+def fix_actions(msi):
+    """Turns the module's actions into calls of the DLL's entries and makes rollback actions
+    roll back; every action must end up in the install script (deferred)."""
     table = subprocess.run(["msiinfo", "export", msi, "CustomAction"], check=True,
                            capture_output=True, text=True).stdout.splitlines()
     for row in table[3:]:
-        action, kind = row.split("\t")[:2]
-        kind = int(kind)
+        action, written = row.split("\t")[:2]
+        kind = int(written)
         if action in DLL_ACTIONS:
             if kind & SOURCE_TYPE_BITS != EXE_FILE:
                 sys.exit(f"{action}: unexpected action type {kind}")
             kind = (kind & ~SOURCE_TYPE_BITS) | DLL_FILE
+        if action in ROLLBACK_ACTIONS:
+            kind |= IN_SCRIPT | ROLLBACK
+        if not kind & IN_SCRIPT:
+            sys.exit(f"{action}: not a deferred action ({kind})")
+        if kind != int(written):
             subprocess.run(["msibuild", msi, "-q",
                             f"UPDATE `CustomAction` SET `Type` = {kind} WHERE `Action` = '{action}'"], check=True)
 
@@ -110,7 +120,7 @@ def main():
     out = os.path.abspath(args.out)
     subprocess.run(["wixl", "-a", "x64", "-D", f"Version={version}", "-o", out, "product.wxs", "samples.wxs"],
                    cwd=args.work, check=True)
-    make_dll_actions(out)
+    fix_actions(out)
     print(f"installer: {out} version {version}")
 
 
