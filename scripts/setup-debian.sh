@@ -9,6 +9,7 @@ packages=(
   libwine-dev wine64-tools                     # the .idl files widl imports; Wine's widl for type libraries
   wine wine64                                  # runs the DLL, the simulator and the tests
   xvfb xauth xdotool imagemagick               # windows without a screen, input, screenshots
+  wixl msitools                                # the MSI installer (wixl), msibuild and msiinfo
   googletest                                   # sources, built with the MinGW toolchain
 )
 

@@ -5,7 +5,7 @@
 set -euo pipefail
 build=$1 dll=$2 sim=${3:-}
 run="$build/wine-run"
-prefix=$(sed -n 's/^export WINEPREFIX="\(.*\)"$/\1/p' "$run")
+prefix=${CALVEX_WINEPREFIX:-$(sed -n 's/^export WINEPREFIX="${CALVEX_WINEPREFIX:-\(.*\)}"$/\1/p' "$run")}
 export WINEPREFIX="$prefix" WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml=" WINEARCH=win64
 
 if [ ! -f "$prefix/.calvex-ready" ]; then

@@ -1,19 +1,67 @@
 #!/usr/bin/env bash
-# explorer_walk_check.sh BUILD_DIR [SHOTS_DIR]: a person's walk through Wine's own Explorer.
+# explorer-walk.sh BUILD_DIR [options]: a person's walk through Wine's own Explorer.
 # Opens My Computer, then each brand folder and one of its receivers, by keyboard as a user
 # does (type-ahead and Enter); at each level reads what our view's list control shows
 # (view_probe) and compares it with the namespace as calvex-shell lists it through the shell.
 # In the first brand it widens two columns with the mouse and checks that the receiver's view
-# takes the widths over, and it copies a receiver's files out through the view's menu.
-# Screenshots of each level go to SHOTS_DIR (default BUILD_DIR/shots).
+# takes the widths over, and it copies a receiver's files out through the view's menu, checking
+# each one's bytes and time against the receiver's own file. Exits non-zero on any failure.
+#   --install none|regsvr32|msi  how the product gets into the prefix: as it is (default), the
+#                                tests' regsvr32 preparation, or a fresh prefix and the MSI
+#                                with the simulator feature
+#   --prefix DIR                 the Wine prefix (default: the tests' prefix)
+#   --shots DIR                  screenshots (default BUILD_DIR/shots)
+#   --rate BYTES                 the simulator's download rate while copying, so that the
+#                                progress dialog stays up for its screenshot
+#   --report FILE                the walk's report: screenshots and each file copied
+#   --brands "calvex brennor"    the brand folders to walk (default both)
 set -u
-build=$1
-shots=${2:-$build/shots}
+build=$1; shift
+install=none prefix="" shots=$build/shots rate="" report=/dev/null brands="calvex brennor"
+while [ $# -gt 0 ]; do
+  case $1 in
+    --install) install=$2 ;;
+    --prefix) prefix=$2 ;;
+    --shots) shots=$2 ;;
+    --rate) rate=$2 ;;
+    --report) report=$2 ;;
+    --brands) brands=$2 ;;
+    *) echo "unknown option $1" >&2; exit 2 ;;
+  esac
+  shift 2
+done
+here=$(cd "$(dirname "$0")/.." && pwd)
 mkdir -p "$shots"
+rm -f "$shots"/*.png  # a picture of an earlier walk must not pass for this one's
 run="$build/wine-run"
+[ -n "$prefix" ] && export CALVEX_WINEPREFIX=$prefix
+export WINEPREFIX=${prefix:-$(sed -n 's/^export WINEPREFIX="${CALVEX_WINEPREFIX:-\(.*\)}"$/\1/p' "$run")}
+export WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml=" WINEARCH=win64
 pass=0 fail=0
 ok() { pass=$((pass + 1)); }
 bad() { fail=$((fail + 1)); echo "FAIL: $*"; }
+say() { echo "$*" | tee -a "$report"; }
+: >"$report"
+
+samples=$here/sample-receivers
+case $install in
+  none) ;;
+  regsvr32) "$here/tests/wine/prepare-prefix.sh" "$build" "$build/CalvexReceiversShellExt.dll" \
+              "$build/CalvexDeviceSim.exe" >/dev/null || { echo "FAIL: regsvr32 registration"; exit 1; } ;;
+  msi)
+    rm -rf "$WINEPREFIX"
+    wineboot -i >/dev/null 2>&1; wineserver -w
+    "$run" reg add 'HKCU\Software\Wine\WineDbg' /v ShowCrashDialog /t REG_DWORD /d 0 /f >/dev/null 2>&1
+    "$run" msiexec /i "$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null)" /qn ADDLOCAL=ALL
+    code=$?
+    [ $code -eq 0 ] || { echo "FAIL: msiexec /i ended with $code"; exit 1; }
+    say "Installed CalvexReceiversShellExt.msi (with the simulated device manager) into $WINEPREFIX"
+    samples="$WINEPREFIX/drive_c/Program Files/Calvex/Receivers Shell Extension/sample-receivers" ;;
+  *) echo "unknown install $install" >&2; exit 2 ;;
+esac
+if [ -n "$rate" ]; then
+  "$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Rate /t REG_DWORD /d "$rate" /f >/dev/null 2>&1
+fi
 
 tree=$("$run" "$build/calvex-shell.exe" tree 2>/dev/null | tr -d '\r')
 probe() { "$run" "$build/view_probe.exe" 2>/dev/null | tr -d '\r'; }
@@ -46,7 +94,10 @@ drag_divider() {
 
 "$run" explorer >/dev/null 2>&1 &
 explorer=$!
-cleanup() { kill "$explorer" 2>/dev/null; "$run" taskkill /f /im explorer.exe >/dev/null 2>&1; }
+cleanup() {
+  kill "$explorer" 2>/dev/null; "$run" taskkill /f /im explorer.exe >/dev/null 2>&1
+  [ "$install" = msi ] && wineserver -k  # the prefix is this walk's own
+}
 trap cleanup EXIT
 for i in $(seq 1 60); do xdotool search --name '^Desktop$' >/dev/null 2>&1 && break; sleep 0.5; done
 sleep 2
@@ -111,6 +162,19 @@ walk_brand() {
   xdotool mousemove 81 40 click 1; sleep 1.5
 }
 
+# Waits for the download's progress dialog and photographs it while it runs.
+progress_shot() {
+  local i
+  for i in $(seq 1 50); do
+    if xdotool search --name '^File Download$' >/dev/null 2>&1; then
+      sleep 1.5  # until the bar has moved and the dialog is painted
+      import -window root "$shots/progress.png"; ok; return
+    fi
+    sleep 0.2
+  done
+  bad "no progress dialog while copying"
+}
+
 # Copies every file of the open receiver as a user does (select all, right-click menu, Copy),
 # pastes them with calvex-paste and compares each with the receiver's own file: bytes and time.
 copy_all() {
@@ -121,19 +185,25 @@ copy_all() {
   xdotool key shift+F10; sleep 1  # the menu opens at the top left: a keyboard menu has no point
   import -window root "$shots/copy-menu.png"
   xdotool key c; sleep 1
-  local out
-  out=$("$run" "$build/calvex-paste.exe" "$(winepath -w "$target" 2>/dev/null)" 2>/dev/null | tr -d '\r')
-  echo "$out"
+  local out=$target.out
+  "$run" "$build/calvex-paste.exe" "$(winepath -w "$target" 2>/dev/null)" >"$out" 2>/dev/null &
+  local paste=$!
+  [ -n "$rate" ] && progress_shot
+  wait $paste
+  tr -d '\r' <"$out"; rm -f "$out"
+  say "Copied the files of $(basename "$folder") out through Copy and calvex-paste:"
   local file name
   for file in "$folder"/*; do
     name=$(basename "$file")
     [ "$name" = receiver.ini ] && continue
     local copied="$target/$name.qpr"
-    if cmp -s "$file" "$copied"; then ok; else bad "copied $name.qpr differs from the receiver's file or is missing"; fi
-    local when
+    local same="bytes equal" timed="time equal" when
+    if cmp -s "$file" "$copied"; then ok; else same="BYTES DIFFER"; bad "copied $name.qpr differs from the receiver's file or is missing"; fi
     when=$(sed -n "s/^$name=//p" "$folder/receiver.ini")
     if [ -n "$when" ] && [ "$(stat -c %Y "$copied" 2>/dev/null)" = "$(date -u -d "$when" +%s)" ]; then ok
-    else bad "copied $name.qpr does not carry the time $when"; fi
+    else timed="TIME DIFFERS"; bad "copied $name.qpr does not carry the time $when"; fi
+    say "$(printf '  %-16s %9s bytes  %s  %s, %s' "$name.qpr" "$(stat -c %s "$copied" 2>/dev/null)" \
+      "$(date -u -d "@$(stat -c %Y "$copied" 2>/dev/null || echo 0)" '+%Y-%m-%d %H:%M:%S')" "$same" "$timed")"
   done
   [ "$(ls -A "$target" | grep -c 'calvex-partial')" -eq 0 ] && ok || bad "a temporary file was left in the target"
   rm -rf "$target"
@@ -142,11 +212,20 @@ copy_all() {
 click_list 400 300
 open_item "My"
 sleep 2
-copy_from="$(dirname "$0")/../../sample-receivers/Calvex Q9 USB" widen=1
-walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
-copy_from="" widen=""
-walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
+if [[ " $brands " == *" calvex "* ]]; then
+  copy_from="$samples/Calvex Q9 USB" widen=1
+  walk_brand "Calvex" "E102076F" "Q9 GNSS@USB" "calvex"
+fi
+if [[ " $brands " == *" brennor "* ]]; then
+  copy_from="" widen=""
+  walk_brand "Brennor" "E65CDE76" "HVL3-GNSS@USB" "brennor"
+fi
 
+[ -n "$rate" ] && "$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Rate /f >/dev/null 2>&1
 [ $fail -eq 0 ] || { echo "--- the namespace"; echo "$tree"; echo "--- the last view"; echo "$view"; }
-echo "$pass passed, $fail failed"
+say "Screenshots:"
+for shot in calvex-receivers calvex-files progress; do
+  [ -s "$shots/$shot.png" ] && say "  $shots/$shot.png"
+done
+say "$pass checks passed, $fail failed"
 [ $fail -eq 0 ]
