@@ -77,12 +77,14 @@ def xml(text):
     return text.replace("&", "&amp;").replace('"', "&quot;").replace("<", "&lt;").replace(">", "&gt;")
 
 
-def stage(work, dll, sim, samples):
+def stage(work, dll, sim, fetch, samples):
     """wixl reads sources by relative path: link the inputs into one directory."""
     if os.path.isdir(work):
         shutil.rmtree(work)
     os.makedirs(work)
-    for name, target in (("CalvexReceiversShellExt.dll", dll), ("CalvexDeviceSim.exe", sim), ("samples", samples)):
+    inputs = (("CalvexReceiversShellExt.dll", dll), ("CalvexDeviceSim.exe", sim), ("calvex-fetch.exe", fetch),
+              ("samples", samples))
+    for name, target in inputs:
         os.symlink(os.path.abspath(target), os.path.join(work, name))
 
 
@@ -109,11 +111,11 @@ def fix_actions(msi):
 
 def main():
     p = argparse.ArgumentParser()
-    for a in ("wxs", "dll", "sim", "samples", "work", "out"):
+    for a in ("wxs", "dll", "sim", "fetch", "samples", "work", "out"):
         p.add_argument("--" + a, required=True)
     args = p.parse_args()
     version = file_version(args.dll)
-    stage(args.work, args.dll, args.sim, args.samples)
+    stage(args.work, args.dll, args.sim, args.fetch, args.samples)
     with open(os.path.join(args.work, "samples.wxs"), "w", encoding="utf-8") as f:
         f.write(sample_fragment(args.samples))
     shutil.copy(args.wxs, os.path.join(args.work, "product.wxs"))

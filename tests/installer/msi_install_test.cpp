@@ -76,9 +76,11 @@ void ExpectState(State state) {
     if (state == kNothing) {
         ExpectModuleUnregistered();
         EXPECT_FALSE(FileExists(dll));
+        EXPECT_FALSE(FileExists(InstallDir() + L"\\calvex-fetch.exe"));
         EXPECT_TRUE(InstalledVersions().empty());
     } else {
         ExpectModuleRegistered(dll);
+        EXPECT_TRUE(FileExists(InstallDir() + L"\\calvex-fetch.exe"));
         EXPECT_EQ(std::vector<std::wstring>{FileVersion(dll)}, InstalledVersions()) << "one product, the DLL's version";
     }
     const bool simulator = state == kExtensionAndSimulator;
