@@ -51,7 +51,7 @@ case $install in
   msi)
     rm -rf "$WINEPREFIX"
     wineboot -i >/dev/null 2>&1; wineserver -w
-    "$run" reg add 'HKCU\Software\Wine\WineDbg' /v ShowCrashDialog /t REG_DWORD /d 0 /f >/dev/null 2>&1
+    "$here/tests/wine/prefix-settings.sh" "$run"
     "$run" msiexec /i "$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null)" /qn ADDLOCAL=ALL
     code=$?
     [ $code -eq 0 ] || { echo "FAIL: msiexec /i ended with $code"; exit 1; }

@@ -14,8 +14,7 @@ if [ ! -f "$prefix/.calvex-ready" ]; then
   wineserver -w
   touch "$prefix/.calvex-ready"
 fi
-# A crashing program must end, not wait on Wine's crash dialog until the test times out.
-"$run" reg add 'HKCU\Software\Wine\WineDbg' /v ShowCrashDialog /t REG_DWORD /d 0 /f >/dev/null 2>&1 || true
+"$(dirname "$0")/prefix-settings.sh" "$run"
 winpath() { winepath -w "$1" 2>/dev/null; }
 "$run" regsvr32 /s "$(winpath "$dll")"
 if [ -n "$sim" ]; then
