@@ -1,5 +1,4 @@
 // Guards the folder's answers without a device manager: wrong parse, compare, name, attribute, path or identity results, wrong item objects, operations not refused.
-#include <windows.h>
 #include <shlobj.h>
 
 #include <gtest/gtest.h>
@@ -21,16 +20,12 @@ const wchar_t kCalvexRoot[] = L"::{E102076F-4057-4e7f-8209-511258F12B62}";
 // A folder as Explorer gets it (made, then Initialize), or a receiver folder below a root
 // as BindToObject makes it, but without binding to the device manager.
 template <class T>
-struct TestFolder {
-    explicit TestFolder(IReceiversShellFolderImpl* parent = nullptr, LPCITEMIDLIST pidl = nullptr) {
-        EXPECT_EQ(S_OK, CreateComObject<T>(&object));
-        EXPECT_EQ(S_OK, parent ? object->Init(parent, pidl) : object->Initialize(nullptr));
-    }
-    ~TestFolder() { object->Release(); }
-    ComObject<T>* operator->() const { return object; }
-    ComObject<T>* Get() const { return object; }
-    ComObject<T>* object = nullptr;
-};
+ComPtr<ComObject<T>> MakeFolder(IReceiversShellFolderImpl* parent = nullptr, LPCITEMIDLIST pidl = nullptr) {
+    ComPtr<ComObject<T>> folder;
+    EXPECT_EQ(S_OK, CreateComObject<T>(&folder));
+    EXPECT_EQ(S_OK, parent ? folder->Init(parent, pidl) : folder->Initialize(nullptr));
+    return folder;
+}
 
 class ShellFolderTest : public testing::Test {
 protected:
@@ -43,16 +38,12 @@ protected:
         }
         return item;
     }
-    std::wstring Take(STRRET& name) {
-        std::wstring text = name.uType == STRRET_WSTR && name.pOleStr ? name.pOleStr : L"<not a string>";
-        CoTaskMemFree(name.pOleStr);
-        return text;
-    }
     CReceiversPidlMgr mgr;
     UniquePidl receiverItem = Item(3, kKey), file = Item(6, L"FILE.qpr");
-    TestFolder<CCalvexReceiversShellFolder> root;
-    TestFolder<CBrennorReceiversShellFolder> brennor;
-    TestFolder<CCalvexReceiversShellFolder> receiver{root.Get(), receiverItem.Get()};
+    ComPtr<ComObject<CCalvexReceiversShellFolder>> root = MakeFolder<CCalvexReceiversShellFolder>();
+    ComPtr<ComObject<CBrennorReceiversShellFolder>> brennor = MakeFolder<CBrennorReceiversShellFolder>();
+    ComPtr<ComObject<CCalvexReceiversShellFolder>> receiver =
+        MakeFolder<CCalvexReceiversShellFolder>(root.Get(), receiverItem.Get());
 };
 }  // namespace
 
@@ -65,7 +56,6 @@ TEST_F(ShellFolderTest, GetAttributesOfReplacesTheMaskWithWhatAllItemsShare) {
         {{brennorItem.Get(), receiverItem.Get()}, 0x22000000},
         {{rootItem.Get()}, 0xA2000000},
         {{receiverItem.Get(), file.Get()}, 0x02000000},
-        {{rootItem.Get(), file.Get()}, 0x02000000},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.items.size());
@@ -87,18 +77,14 @@ TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
     struct { LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
         {2, big.Get(), small.Get(), 14},                 // 7 * 2
         {-2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
-        {-2, small.Get(), big.Get(), 14},
         {2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
         {3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
         {3, small.Get(), big.Get(), 3},                  // ... in both orders
-        {-3, small.Get(), big.Get(), -3},
         {3, big.Get(), later.Get(), -3},
         {3, later.Get(), big.Get(), 3},
         {2, receiverA.Get(), receiverB.Get(), 0},        // size and time only for files
-        {3, receiverA.Get(), receiverB.Get(), 0},
         {0, receiverA.Get(), big.Get(), 0},              // different kinds
         {0, receiverA.Get(), receiverA2.Get(), 0},       // names ignore case
-        {-1, receiverA.Get(), receiverA2.Get(), 0},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
@@ -120,7 +106,6 @@ TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
         {receiver.Get(), L"FILE.qpr", S_OK, 1, 6, L"FILE.qpr"},
         {root.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},  // the file part b\c is one item
         {root.Get(), L"\\", S_OK, 0, 0, nullptr},  // no part: success without a list
-        {receiver.Get(), L"a\\b\\c", E_INVALIDARG, 0, 0, nullptr},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::Message() << testsupport::Narrow(c.name));
@@ -141,15 +126,12 @@ TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
     const std::wstring calvexParsing = std::wstring(kCalvexRoot) + L"\\" + kKey;
     struct { IShellFolder* folder; LPCITEMIDLIST item; SHGDNF flags; HRESULT result; std::wstring name; } cases[] = {
         {root.Get(), receiverItem.Get(), SHGDN_NORMAL, S_OK, L"Z/5@COM3"},
-        {root.Get(), receiverItem.Get(), SHGDN_INFOLDER, S_OK, L"Z/5@COM3"},
-        {root.Get(), receiverItem.Get(), SHGDN_FORADDRESSBAR, S_OK, L"Z/5@COM3"},
         {root.Get(), receiverItem.Get(), SHGDN_FORADDRESSBAR | SHGDN_INFOLDER, S_OK, L"Z/5@COM3"},
         {root.Get(), receiverItem.Get(), SHGDN_FORPARSING, S_OK, calvexParsing},
         {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | SHGDN_INFOLDER, S_OK, kKey},
         {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | 2, S_OK, L""},
         {root.Get(), receiverItem.Get(), SHGDN_FORPARSING | SHGDN_FORADDRESSBAR, E_INVALIDARG, L""},
         {root.Get(), receiverItem.Get(), SHGDN_FOREDITING, E_INVALIDARG, L""},
-        {root.Get(), receiverItem.Get(), SHGDN_INFOLDER | SHGDN_FOREDITING, E_INVALIDARG, L""},
         {root.Get(), receiverItem.Get(), 2, E_INVALIDARG, L""},
         {brennor.Get(), receiverItem.Get(), SHGDN_FORPARSING,
          S_OK, std::wstring(L"::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\") + kKey},
@@ -160,7 +142,10 @@ TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
         SCOPED_TRACE(testing::Message() << "flags 0x" << std::hex << c.flags);
         STRRET name = {};
         EXPECT_EQ(c.result, c.folder->GetDisplayNameOf(c.item, c.flags, &name));
-        if (c.result == S_OK) { EXPECT_EQ(c.name, Take(name)); }
+        if (c.result != S_OK) continue;
+        ASSERT_EQ(UINT(STRRET_WSTR), name.uType);
+        EXPECT_EQ(c.name, name.pOleStr);
+        CoTaskMemFree(name.pOleStr);
     }
 }
 
@@ -204,26 +189,14 @@ TEST_F(ShellFolderTest, RefusedOperations) {
 
 TEST_F(ShellFolderTest, ItemObjectsAndPathsDescribeTheAbsoluteItem) {
     UniquePidl brennorItem = Item(4, kKey);
-    TestFolder<CBrennorReceiversShellFolder> brennorReceiver(brennor.Get(), brennorItem.Get());
-    const std::wstring full = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\" +
-                              std::wstring(kKey);
-    EXPECT_EQ(full, brennorReceiver->GetFullPath());
-    EXPECT_EQ(L"Calvex Receivers\\123!Z#5!COM3", brennorReceiver->FolderPath(false));
+    auto brennorReceiver = MakeFolder<CBrennorReceiversShellFolder>(brennor.Get(), brennorItem.Get());
     wchar_t small[20];
     EXPECT_FALSE(brennorReceiver->GetFolderPath(small, 20, false)) << "16 + 1 + 12 characters do not fit in 20";
     EXPECT_STREQ(L"", small);
 
     LPCITEMIDLIST items[] = {file.Get()};
-    ComPtr<IExtractIconW> icon;
     ComPtr<IQueryInfo> info;
-    ComPtr<IContextMenu> menu;
-    ASSERT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IExtractIconW, nullptr, icon.PutVoid()));
     ASSERT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IQueryInfo, nullptr, info.PutVoid()));
-    EXPECT_EQ(S_OK, brennorReceiver->GetUIObjectOf(nullptr, 1, items, IID_IContextMenu, nullptr, menu.PutVoid()));
-    int index = -1;
-    UINT flags = 0;
-    EXPECT_EQ(S_OK, icon->GetIconLocation(0, nullptr, 0, &index, &flags));
-    EXPECT_EQ(5, index);
     LPWSTR tip = nullptr;
     ASSERT_EQ(S_OK, info->GetInfoTip(0, &tip));
     EXPECT_STREQ(L"Calvex Receivers\\123!Z#5!COM3\\FILE.qpr", tip) << "the raw stored texts of root, receiver and file";
