@@ -60,7 +60,6 @@ void SetDeviceSimCallFailure(const std::wstring& call, HRESULT result) {
                     sizeof value);
 }
 
-// The sample tree without faults, and no server of an earlier tree left.
 static void RestoreDeviceSimDefaults() {
     StopDeviceSimServers();
     RegDeleteTreeW(HKEY_CURRENT_USER, kSimKey);

@@ -1,9 +1,7 @@
 #pragma once
-// Test helpers around the simulated device manager: temporary receiver trees, the one
-// out-of-process simulator that every test program of the Wine prefix shares, and a client's
-// walk through the contract. A test that points the simulator elsewhere (or sets faults in the
-// registry) changes it for everyone: its program must run alone (a sibling <stem>.cmake with
-// set(TEST_SERIAL SERIAL)).
+// Receiver trees, the one out-of-process simulator every test program of the prefix shares,
+// and a client's walk through its contract. A test that repoints or faults the simulator must
+// run alone (a sibling <stem>.cmake with set(TEST_SERIAL SERIAL)).
 #include <windows.h>
 
 #include <string>
@@ -16,8 +14,7 @@
 
 namespace testsupport {
 
-// The fields of one receiver's description file; extra lines are written as they stand
-// (L"[Transfer]", L"Rate=11520").
+// One receiver's description file; extra lines as they stand (L"[Transfer]", L"Rate=11520").
 struct ReceiverSetup {
     std::wstring folder;
     long brand = 1;
@@ -44,7 +41,6 @@ public:
     bool RemoveFile(const std::wstring& folder, const std::wstring& name) {
         return DeleteFileW((FolderPath(folder) + L"\\" + name).c_str()) != FALSE;
     }
-    // Unplugs the receiver: its folder goes with its files.
     bool RemoveReceiver(const std::wstring& folder) { return DeleteTree(FolderPath(folder)); }
 
 private:
@@ -53,14 +49,12 @@ private:
 
 inline bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
 
-// Makes every running CalvexDeviceSim.exe of the prefix quit ("/Quit") and waits until they
-// are gone; this thread's messages are pumped meanwhile.
+// Makes every CalvexDeviceSim.exe of the prefix quit and waits, pumping this thread's messages.
 void StopDeviceSimServers();
 // A call's result for every receiver ("IReceiver.get_Label"), in the simulator's registry key.
 void SetDeviceSimCallFailure(const std::wstring& call, HRESULT result);
 
-// Scope of a test that owns the out-of-process simulator: the sample tree (or root) without
-// faults, and no server left from before or after.
+// The simulator of the sample tree (or root) without faults, and no server from before or after.
 class DeviceSimScope {
 public:
     explicit DeviceSimScope(const std::wstring& root = std::wstring());
