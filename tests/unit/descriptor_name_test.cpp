@@ -93,14 +93,6 @@ TEST(DescriptorNameTest, FolderNamesFromDisplayNamesStayOneComponent) {
     for (const NameCase& row : rows) ExpectRule(row, MakeSafeFolderName(row.given, row.target));
 }
 
-FILEDESCRIPTORW Descriptor(const std::wstring& name, DWORD size) {
-    FILEDESCRIPTORW descriptor = {};
-    descriptor.dwFlags = FD_FILESIZE;
-    descriptor.nFileSizeLow = size;
-    lstrcpynW(descriptor.cFileName, name.c_str(), MAX_PATH);
-    return descriptor;
-}
-
 TEST(DescriptorNameTest, WriteVirtualFileWritesOnlyBelowTheTarget) {
     struct WriteCase {
         const wchar_t* name;
@@ -121,10 +113,13 @@ TEST(DescriptorNameTest, WriteVirtualFileWritesOnlyBelowTheTarget) {
         TempDirectory outer(L"calvex-names");
         const std::wstring target = outer.Path() + L"\\inner";
         ASSERT_TRUE(CreateDirectoryW(target.c_str(), nullptr));
+        FILEDESCRIPTORW descriptor = {FD_FILESIZE};
+        descriptor.nFileSizeLow = row.size;
+        lstrcpynW(descriptor.cFileName, row.name, MAX_PATH);
         std::wstring error;
         ComPtr<IStream> stream;
         stream.Attach(SHCreateMemStream(reinterpret_cast<const BYTE*>("hello"), 5));
-        EXPECT_EQ(row.expected, WriteVirtualFile(target, Descriptor(row.name, row.size), stream.Get(), error));
+        EXPECT_EQ(row.expected, WriteVirtualFile(target, descriptor, stream.Get(), error));
         EXPECT_EQ(row.expected == S_OK, error.empty()) << Narrow(error);
         if (row.written) EXPECT_EQ("hello", ReadFileBytes(outer.Path() + L"\\" + row.written));
         // Nothing else anywhere: without the written file, every folder must be empty to go.
