@@ -1,13 +1,14 @@
 // Guards the MSI: keys registration misses or leaves behind, files left after removal, a version that is not the DLL's, a repeated install or removal that breaks the first.
 #include <windows.h>
 #include <msi.h>
-#include <shlobj.h>
 
+#include <cstdlib>
 #include <string>
 #include <vector>
 
 #include <gtest/gtest.h>
 
+#include "support/DeviceSim.h"
 #include "support/RegistrationExpectations.h"
 #include "support/TestSupport.h"
 
@@ -18,24 +19,7 @@ const wchar_t kUpgradeCode[] = L"{3F4C8E0B-61D2-4B5A-9C3E-7A0D2E5B9C41}";
 const wchar_t kDeviceMgr[] = L"CLSID\\{0FADF314-B4FD-413C-9E26-6BC49B066080}\\LocalServer32";
 const wchar_t kSimSettings[] = L"Software\\Calvex\\DeviceSim";
 
-std::wstring InstallDir() {
-    wchar_t programFiles[MAX_PATH] = L"";
-    SHGetFolderPathW(nullptr, CSIDL_PROGRAM_FILES, nullptr, SHGFP_TYPE_CURRENT, programFiles);
-    return std::wstring(programFiles) + L"\\Calvex\\Receivers Shell Extension";
-}
-
-bool FileExists(const std::wstring& path) { return GetFileAttributesW(path.c_str()) != INVALID_FILE_ATTRIBUTES; }
-
-std::wstring FileVersion(const std::wstring& path) {
-    std::vector<BYTE> block(GetFileVersionInfoSizeW(path.c_str(), nullptr));
-    VS_FIXEDFILEINFO* info = nullptr;
-    UINT size = 0;
-    if (block.empty() || !GetFileVersionInfoW(path.c_str(), 0, static_cast<DWORD>(block.size()), block.data()) ||
-        !VerQueryValueW(block.data(), L"\\", reinterpret_cast<void**>(&info), &size))
-        return L"<none>";
-    return std::to_wstring(HIWORD(info->dwFileVersionMS)) + L"." + std::to_wstring(LOWORD(info->dwFileVersionMS)) +
-           L"." + std::to_wstring(HIWORD(info->dwFileVersionLS)) + L"." + std::to_wstring(LOWORD(info->dwFileVersionLS));
-}
+std::wstring InstallDir() { return std::wstring(_wgetenv(L"ProgramFiles")) + L"\\Calvex\\Receivers Shell Extension"; }
 
 // The installed products of this upgrade code with their versions.
 std::vector<std::wstring> InstalledVersions() {
@@ -81,7 +65,10 @@ void ExpectState(State state) {
     } else {
         ExpectModuleRegistered(dll);
         EXPECT_TRUE(FileExists(InstallDir() + L"\\calvex-fetch.exe"));
-        EXPECT_EQ(std::vector<std::wstring>{FileVersion(dll)}, InstalledVersions()) << "one product, the DLL's version";
+        wchar_t version[64] = L"";
+        DWORD size = 64;
+        EXPECT_EQ(0u, MsiGetFileVersionW(dll.c_str(), version, &size, nullptr, nullptr));
+        EXPECT_EQ(std::vector<std::wstring>{version}, InstalledVersions()) << "one product, the DLL's version";
     }
     const bool simulator = state == kExtensionAndSimulator;
     EXPECT_EQ(simulator ? L"\"" + sim + L"\"" : L"<none>", RegistryText(HKEY_CLASSES_ROOT, kDeviceMgr));
