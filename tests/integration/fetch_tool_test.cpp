@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -148,12 +149,19 @@ TEST_F(FetchToolTest, PicksReceiversByKeyDisplayNameAndBrand) {
     }
 }
 
+// Registered again however the test ends.
+struct UnregisteredDeviceManager {
+    UnregisteredDeviceManager() { RunProcess(Quoted(BuildDir() + L"\\CalvexDeviceSim.exe") + L" /UnregServer"); }
+    ~UnregisteredDeviceManager() { RunProcess(Quoted(BuildDir() + L"\\CalvexDeviceSim.exe") + L" /RegServer"); }
+};
+
 TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
     const std::wstring file = target.Path() + L"\\a-file";
     ASSERT_TRUE(CloseHandle(CreateFileW(file.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_NEW, 0, nullptr)));
     struct Refusal {
         std::wstring arguments;
         const char* message;  // on stderr
+        bool noDeviceManager = false;
     };
     const Refusal refusals[] = {
         {Quoted(file), "calvex-fetch: target not writable: "},
@@ -163,28 +171,18 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
         {L"--all --new " + Quoted(target.Path()), "calvex-fetch: --all and --new exclude each other\r\n"},
         {L"--receiver", "calvex-fetch: --receiver needs a value\r\n"},
         {L"--dry-run", "calvex-fetch: no TARGET folder given\r\n"},
+        {Quoted(target.Path()), "calvex-fetch: no device manager: it cannot be started (0x", true},
     };
     for (const Refusal& refusal : refusals) {
         SCOPED_TRACE(Narrow(refusal.arguments));
+        std::optional<UnregisteredDeviceManager> unregistered;
+        if (refusal.noDeviceManager) unregistered.emplace();
         const FetchRun run = RunFetch(refusal.arguments);
         EXPECT_EQ(2u, run.exitCode);
         EXPECT_EQ(0u, run.err.find(refusal.message)) << run.err;
         EXPECT_EQ(0, run.Count(" fetched, ")) << run.out;
     }
     EXPECT_EQ(std::vector<std::wstring>{L"a-file"}, ListFiles(target.Path()));
-}
-
-// Registered again however the test ends.
-struct UnregisteredDeviceManager {
-    UnregisteredDeviceManager() { RunProcess(Quoted(BuildDir() + L"\\CalvexDeviceSim.exe") + L" /UnregServer"); }
-    ~UnregisteredDeviceManager() { RunProcess(Quoted(BuildDir() + L"\\CalvexDeviceSim.exe") + L" /RegServer"); }
-};
-
-TEST_F(FetchToolTest, NoDeviceManagerExitsTwo) {
-    UnregisteredDeviceManager unregistered;
-    const FetchRun run = RunFetch(Quoted(target.Path()));
-    EXPECT_EQ(2u, run.exitCode) << run.out;
-    EXPECT_EQ(0u, run.err.find("calvex-fetch: no device manager: it cannot be started (0x")) << run.err;
 }
 
 TEST_F(FetchToolTest, FailedDownloadLeavesNoFileAndExitsOne) {
