@@ -59,16 +59,13 @@ void ExpectState(State state) {
     const std::wstring sim = InstallDir() + L"\\CalvexDeviceSim.exe";
     EXPECT_EQ(state != kNothing, FileExists(dll));
     EXPECT_EQ(state != kNothing, FileExists(InstallDir() + L"\\calvex-fetch.exe"));
-    if (state == kNothing) {
-        ExpectModuleUnregistered();
-        EXPECT_TRUE(InstalledVersions().empty());
-    } else {
-        ExpectModuleRegistered(dll);
-        wchar_t version[64] = L"";
-        DWORD size = 64;
-        EXPECT_EQ(0u, MsiGetFileVersionW(dll.c_str(), version, &size, nullptr, nullptr));
-        EXPECT_EQ(std::vector<std::wstring>{version}, InstalledVersions()) << "one product, the DLL's version";
-    }
+    if (state == kNothing) ExpectModuleUnregistered();
+    else ExpectModuleRegistered(dll);
+    wchar_t version[64] = L"";
+    DWORD size = 64;
+    MsiGetFileVersionW(dll.c_str(), version, &size, nullptr, nullptr);  // fails and leaves "" without the DLL
+    const std::vector<std::wstring> product = {version}, none;
+    EXPECT_EQ(state == kNothing ? none : product, InstalledVersions()) << "one product, the DLL's version";
     const bool simulator = state == kExtensionAndSimulator;
     EXPECT_EQ(simulator ? L"\"" + sim + L"\"" : L"<none>", RegistryText(HKEY_CLASSES_ROOT, kDeviceMgr));
     EXPECT_EQ(simulator ? InstallDir() + L"\\sample-receivers\\" : L"<none>",
