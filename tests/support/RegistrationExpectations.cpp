@@ -25,12 +25,6 @@ std::wstring RegistryText(HKEY root, const std::wstring& path, const wchar_t* na
                ? std::wstring(text) : L"<none>";
 }
 
-bool FolderAttributes(const std::wstring& clsid, DWORD* value) {
-    DWORD size = sizeof *value;
-    return RegGetValueW(HKEY_CLASSES_ROOT, (L"CLSID\\" + clsid + L"\\ShellFolder").c_str(), L"Attributes",
-                        RRF_RT_REG_DWORD, nullptr, value, &size) == ERROR_SUCCESS;
-}
-
 void ExpectModuleRegistered(const std::wstring& dll) {
     struct Folder { std::wstring clsid, name, icon, tip; } folders[] = {
         {kCalvex, L"Calvex GNSS Receivers", L",0", L"Allows you to read files from QPR receivers"},
@@ -45,8 +39,9 @@ void ExpectModuleRegistered(const std::wstring& dll) {
         EXPECT_EQ(L"Apartment", RegistryText(HKEY_CLASSES_ROOT, key + L"\\InprocServer32", L"ThreadingModel"));
         EXPECT_EQ(L"{274B0214-A88B-43fd-AE0A-CD342C4C748F}", RegistryText(HKEY_CLASSES_ROOT, key + L"\\TypeLib"));
         EXPECT_EQ(f.tip, RegistryText(HKEY_CLASSES_ROOT, key, L"InfoTip"));
-        DWORD attributes = 0;
-        EXPECT_TRUE(FolderAttributes(f.clsid, &attributes));
+        DWORD attributes = 0, size = sizeof attributes;
+        RegGetValueW(HKEY_CLASSES_ROOT, (key + L"\\ShellFolder").c_str(), L"Attributes", RRF_RT_REG_DWORD, nullptr,
+                     &attributes, &size);
         EXPECT_EQ(0xA0000000u, attributes);
         EXPECT_EQ(f.name, RegistryText(HKEY_LOCAL_MACHINE, kNameSpace + f.clsid));
         EXPECT_EQ(f.name, RegistryText(HKEY_LOCAL_MACHINE, kApproved, f.clsid.c_str()));

@@ -10,8 +10,6 @@ namespace testsupport {
 bool RegistryKeyExists(HKEY root, const std::wstring& path);
 // A REG_SZ value's text, or "<none>".
 std::wstring RegistryText(HKEY root, const std::wstring& path, const wchar_t* name = nullptr);
-// The folder's ShellFolder\Attributes value, false when there is none.
-bool FolderAttributes(const std::wstring& clsid, DWORD* value);
 
 // Checks with gtest's EXPECT that every key Explorer needs names the module at dllPath.
 void ExpectModuleRegistered(const std::wstring& dllPath);
