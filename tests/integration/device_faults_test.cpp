@@ -170,7 +170,8 @@ TEST_F(DeviceFaultsTest, EveryFaultEndsInTimeWithTheRightOutcome) {
         {"killed while deleting", {L"[Exit]", L"IReceiverFile.Delete=1"}, DeleteFirst, S_OK, 0, 0, 0, 1, 20000},
         {"negative size", {L"[Report]", L"Size=-5"}, DownloadFirst, S_OK, 4, 0, 1, 0, 20000},
         {"time that is no date", {L"[Report]", L"Time=nan"}, DownloadFirst, S_OK, 4, 1, 0, 0, 20000},
-        {"300-character file names", {L"[Report]", L"NameLength=300"}, DownloadFirst, S_OK, 4, 0, 1, 1, 20000},
+        // Too long for any target: refused by the name rules before a download is asked for.
+        {"300-character file names", {L"[Report]", L"NameLength=300"}, DownloadFirst, S_OK, 4, 0, 1, 0, 20000},
         {"300-character serial number", {}, ListFiles, E_INVALIDARG, -1, 0, 0, 0, 10000, kLongSerial},
         {"empty key", {}, ListFiles, S_OK, 4, 0, 0, 0, 10000, L""},
     };
