@@ -1,7 +1,4 @@
 // Guards Explorer's calls against bad devices: a device manager killed mid-call, a receiver unplugged or answering garbage must never crash, hang past the product's own wait, or leave a partial file.
-#include <windows.h>
-#include <shlobj.h>
-
 #include <gtest/gtest.h>
 
 #include <atomic>

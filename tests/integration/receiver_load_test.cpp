@@ -1,7 +1,4 @@
 // Guards large receivers: a burst of file events that floods Explorer with notifications or view re-fills, and 2,000 files listed, sorted or copied wrongly.
-#include <windows.h>
-#include <shlobj.h>
-
 #include <gtest/gtest.h>
 
 #include <algorithm>
