@@ -54,7 +54,6 @@ void PasteFirst(IShellFolder* receiver, const std::vector<TaskPidl>& files, cons
 // How far an Explorer window goes: the receivers, a receiver's files, pasting or deleting (through
 // the view's Delete) the first of them.
 enum class Step { Receivers, Files, Download, Delete };
-// When the receiver is unplugged, if at all.
 enum class Unplug { Never, AfterListing, WhileDownloading };
 
 Outcome Walk(Step step, const std::wstring& target, const std::function<void()>& afterListing) {

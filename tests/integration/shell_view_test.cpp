@@ -65,7 +65,6 @@ protected:
         scope.reset(new DeviceSimScope(tree.Root()));
         Display() = DisplayState();
     }
-    // A view of our root folder or of its first receiver in the test's browser.
     HostedView& Host(bool files, UINT mode = FVM_DETAILS, IShellView* previous = nullptr) {
         hosts.emplace_back(new HostedView(OurFolder(files), browser, mode, previous));
         return *hosts.back();
