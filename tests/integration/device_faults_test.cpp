@@ -42,15 +42,6 @@ bool FinishesWithin(DWORD limitMs, std::function<void()> work, const std::functi
     return *done;
 }
 
-// Pastes the first of files into target as Explorer's paste does.
-void PasteFirst(IShellFolder* receiver, const std::vector<TaskPidl>& files, const std::wstring& target, Outcome& out) {
-    if (files.empty()) return;
-    LPCITEMIDLIST first = files[0].get();
-    ComPtr<IDataObject> data;
-    out.hr = receiver->GetUIObjectOf(nullptr, 1, &first, IID_IDataObject, nullptr, data.PutVoid());
-    if (data) out.written = PasteVirtualFiles(data.Get(), target, [](const std::wstring&) {}, out.failed);
-}
-
 // How far an Explorer window goes: the receivers, a receiver's files, pasting or deleting (through
 // the view's Delete) the first of them.
 enum class Step { Receivers, Files, Download, Delete };
@@ -75,7 +66,11 @@ Outcome Walk(Step step, const std::wstring& target, const std::function<void()>&
     std::vector<TaskPidl> files = ListItems(receiver.Get(), SHCONTF_NONFOLDERS, &out.hr);
     out.items = static_cast<int>(files.size());
     if (afterListing) afterListing();
-    if (step == Step::Download) PasteFirst(receiver.Get(), files, target, out);
+    if (step != Step::Download || files.empty()) return out;
+    LPCITEMIDLIST first = files[0].get();  // pasted as Explorer's paste does
+    ComPtr<IDataObject> data;
+    out.hr = receiver->GetUIObjectOf(nullptr, 1, &first, IID_IDataObject, nullptr, data.PutVoid());
+    if (data) out.written = PasteVirtualFiles(data.Get(), target, [](const std::wstring&) {}, out.failed);
     return out;
 }
 
