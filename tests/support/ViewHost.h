@@ -4,6 +4,7 @@
 #include <commctrl.h>
 #include <shlobj.h>
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -76,8 +77,9 @@ public:
     ComPtr<IStream> viewState;
 };
 
-// Our root folder of either brand, or its first receiver's folder; null when there is none.
-inline ComPtr<IShellFolder> OurFolder(bool files, bool brennor = false) {
+// Our root folder of either brand, or its first receiver's folder (S_FALSE or the binding's
+// result in bound); null when there is none.
+inline ComPtr<IShellFolder> OurFolder(bool files, bool brennor = false, HRESULT* bound = nullptr) {
     ComPtr<IShellFolder> root, receiver;
     (brennor ? CreateBrennorReceiversShellFolder : CreateCalvexReceiversShellFolder)(nullptr, IID_IShellFolder,
                                                                                      root.PutVoid());
@@ -86,8 +88,16 @@ inline ComPtr<IShellFolder> OurFolder(bool files, bool brennor = false) {
     persist->Initialize(nullptr);
     if (!files) return root;
     std::vector<TaskPidl> items = ListItems(root.Get(), SHCONTF_FOLDERS);
-    if (!items.empty()) root->BindToObject(items[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid());
+    const HRESULT hr =
+        items.empty() ? S_FALSE : root->BindToObject(items[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid());
+    if (bound) *bound = hr;
     return receiver;
+}
+
+// How often the module has traced this exact line so far.
+inline size_t CountTrace(const std::string& line) {
+    const std::vector<std::string> messages = TraceMessages();
+    return std::count(messages.begin(), messages.end(), line);
 }
 
 // One view of a folder in a browser, destroyed at the end of its scope; the folder is not
@@ -103,11 +113,6 @@ struct HostedView {
     ~HostedView() { view->DestroyViewWindow(); }
     CCalvexReceiversShellView* Object() const { return static_cast<CCalvexReceiversShellView*>(view.Get()); }
     int Count() const { return ListView_GetItemCount(list); }
-    std::wstring Cell(int item, int column) const {
-        wchar_t text[260] = L"";
-        ListView_GetItemText(list, item, column, text, 260);
-        return text;
-    }
     void Select(int item) const { ListView_SetItemState(list, item, LVIS_SELECTED, LVIS_SELECTED); }
     ComPtr<IShellView> view;
     HWND window = nullptr, list = nullptr;
