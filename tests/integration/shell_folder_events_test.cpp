@@ -5,42 +5,26 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <map>
 #include <string>
 #include <vector>
 
-#include "com/ComPtr.h"
 #include "folder/CCalvexReceiversShellFolder.h"
 #include "items/CCalvexReceiversNotifyWindow.h"
-#include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 #include "support/DeviceSim.h"
 #include "support/TestSupport.h"
+#include "support/ViewHost.h"
 
 using namespace testsupport;
 
 namespace {
 std::vector<std::wstring> g_notified;
-std::map<HWND, int> g_viewMessages;
 
 void WINAPI RecordNotify(LONG, UINT, LPCVOID item1, LPCVOID) { g_notified.push_back(static_cast<const wchar_t*>(item1)); }
 
-LRESULT CALLBACK ViewProc(HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam) {
-    if (message != RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message"))
-        return DefWindowProcW(hwnd, message, wParam, lParam);
-    ++g_viewMessages[hwnd];
-    return 0;
-}
-
 // A stand-in for a view's window, registered with the folder as a view registers itself.
 HWND AddViewWindow(IShellFolder* folder) {
-    WNDCLASSW windowClass = {};
-    windowClass.lpfnWndProc = ViewProc;
-    windowClass.hInstance = GetModuleHandleW(nullptr);
-    windowClass.lpszClassName = L"TestEventsViewWindow";
-    RegisterClassW(&windowClass);
-    HWND view = CreateWindowExW(0, windowClass.lpszClassName, L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr,
-                                windowClass.hInstance, nullptr);
+    HWND view = CountingViewWindow();
     static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder))->AddViewWindow(view);
     return view;
 }
@@ -58,20 +42,14 @@ TEST(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
     tree.AddReceiver({L"Calvex A"});  // 1000-0001, Q9 GNSS, on USB
     tree.AddFile(L"Calvex A", L"LOG0001", 100);
     DeviceSimScope scope(tree.Root());
-    ComPtr<IShellFolder> root, receiver;
-    ComPtr<IPersistFolder> persist;
-    ASSERT_EQ(S_OK, CreateCalvexReceiversShellFolder(nullptr, IID_IPersistFolder, persist.PutVoid()));
-    ASSERT_EQ(S_OK, persist->Initialize(nullptr));
-    persist.QueryTo(IID_IShellFolder, root.PutVoid());
-    persist.Reset();
     // Listed as Explorer lists them, which binds each folder to its collection.
-    std::vector<TaskPidl> receivers = ListItems(root.Get(), SHCONTF_FOLDERS);
-    ASSERT_EQ(1u, receivers.size());
-    ASSERT_EQ(S_OK, root->BindToObject(receivers[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid()));
+    ComPtr<IShellFolder> root = OurFolder(false), receiver = OurFolder(true);
+    ASSERT_EQ(1u, ListItems(root.Get(), SHCONTF_FOLDERS).size());
+    ASSERT_TRUE(receiver);
     EXPECT_EQ(1u, ListItems(receiver.Get(), SHCONTF_NONFOLDERS).size());
     HWND rootView = AddViewWindow(root.Get()), receiverView = AddViewWindow(receiver.Get());
 
-    const std::wstring rootPath = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
+    const std::wstring& rootPath = kCalvexRootPath;
     const std::wstring receiverPath = rootPath + L"\\1000-0001!Q9 GNSS!USB";
     const struct { void (*change)(ReceiverTree& tree); const char* handlerLine; std::wstring notifiedPath; HWND view; } steps[] = {
         {[](ReceiverTree& t) { t.AddFile(L"Calvex A", L"LOG0002", 200); }, "CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n",
@@ -84,23 +62,23 @@ TEST(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
     for (const auto& step : steps) {
         SCOPED_TRACE(step.handlerLine);
         g_notified.clear();
-        g_viewMessages.clear();
+        ViewMessages().clear();
         const size_t from = ReadTraceLog().size();
         step.change(tree);
         ASSERT_TRUE(WaitForTrace(step.handlerLine, from));
         EXPECT_TRUE(WaitForTrace("IReceiversShellFolderImpl::DoUpdateList\r\n", from));
         EXPECT_TRUE(WaitForTrace("==>CCalvexReceiversNotifyWindow::SendUpdateEvents " + Narrow(step.notifiedPath) + "\r\n",
                                  from));
-        ASSERT_TRUE(PumpUntil([&] { return g_viewMessages[step.view] > 0; }, 12000)) << "the view message";
+        ASSERT_TRUE(PumpUntil([&] { return ViewMessages()[step.view] > 0; }, 12000)) << "the view message";
         PumpMessagesFor(1500);
-        EXPECT_EQ(1, g_viewMessages[step.view]);
+        EXPECT_EQ(1, ViewMessages()[step.view]);
         EXPECT_NE(g_notified.end(), std::find(g_notified.begin(), g_notified.end(), step.notifiedPath));
     }
     EXPECT_TRUE(TraceContains("Advised for receivers, 0x"));
     EXPECT_TRUE(TraceContains("Advised for files, 0x"));
 
     root.Reset();
-    receiver.Reset();  // releases the root last: the receiver folder holds its parent
+    receiver.Reset();  // and its own parent
     EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::FinalRelease - unadvised from files collection\r\n"));
     EXPECT_TRUE(TraceContains("IReceiversShellFolderImpl::FinalRelease - unadvised from receivers collection\r\n"));
     DestroyWindow(rootView);

@@ -5,6 +5,8 @@
 #include <shlobj.h>
 
 #include <algorithm>
+#include <algorithm>
+#include <map>
 #include <string>
 #include <vector>
 
@@ -92,6 +94,31 @@ inline ComPtr<IShellFolder> OurFolder(bool files, bool brennor = false, HRESULT*
         items.empty() ? S_FALSE : root->BindToObject(items[0].get(), nullptr, IID_IShellFolder, receiver.PutVoid());
     if (bound) *bound = hr;
     return receiver;
+}
+
+// The Calvex brand folder under My Computer, as the shell's change notifications name it.
+inline const std::wstring kCalvexRootPath =
+    L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
+
+// Stands in for a view's window: a message-only window that counts the view notification
+// messages the folders post to it, in ViewMessages()[window].
+inline std::map<HWND, int>& ViewMessages() {
+    static std::map<HWND, int> counts;
+    return counts;
+}
+inline HWND CountingViewWindow() {
+    static const ATOM atom = [] {
+        WNDCLASSW windowClass = {};
+        windowClass.lpfnWndProc = [](HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam) -> LRESULT {
+            if (message != RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message"))
+                return DefWindowProcW(hwnd, message, wParam, lParam);
+            return ++ViewMessages()[hwnd], 0;
+        };
+        windowClass.hInstance = GetModuleHandleW(nullptr);
+        windowClass.lpszClassName = L"TestCountingViewWindow";
+        return RegisterClassW(&windowClass);
+    }();
+    return CreateWindowExW(0, MAKEINTATOM(atom), L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, nullptr, nullptr);
 }
 
 // How often the module has traced this exact line so far.

@@ -4,7 +4,6 @@
 
 #include <gtest/gtest.h>
 
-#include <map>
 #include <string>
 #include <thread>
 #include <vector>
@@ -39,26 +38,18 @@ void PostPath(const std::wstring& path) {
     ASSERT_TRUE(PostMessageW(CCalvexReceiversNotifyWindow::GetNotifyWindow(), UpdateFolderMessage(), 0, PathBlock(path)));
 }
 
-std::map<HWND, size_t> g_viewMessages;
-
-LRESULT CALLBACK ViewProc(HWND hwnd, UINT message, WPARAM wParam, LPARAM lParam) {
-    if (message != RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message"))
-        return DefWindowProcW(hwnd, message, wParam, lParam);
-    return ++g_viewMessages[hwnd], 0;
-}
-
 IReceiversShellFolderImpl* Impl(const ComPtr<IShellFolder>& folder) {
     return static_cast<IReceiversShellFolderImpl*>(static_cast<IShellFolder2*>(folder.Get()));
 }
 
-const wchar_t kRoot[] = L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}";
+const std::wstring& kRoot = testsupport::kCalvexRootPath;
 
 class NotifyWindowTest : public testing::Test {
 protected:
     void SetUp() override {
         ASSERT_EQ(S_OK, CModuleApp::Instance().EnsureInitialized());
         g_notifications.clear();
-        g_viewMessages.clear();
+        testsupport::ViewMessages().clear();
         CCalvexReceiversNotifyWindow::SetChangeNotify(RecordNotify);
     }
     void TearDown() override {
@@ -67,12 +58,7 @@ protected:
         CCalvexReceiversNotifyWindow::SetChangeNotify(nullptr);
     }
     HWND View() {  // a window that counts the view notification messages it gets
-        static const ATOM atom = [] {
-            WNDCLASSW windowClass = {0, ViewProc, 0, 0, GetModuleHandleW(nullptr)};
-            windowClass.lpszClassName = L"TestFolderViewWindow";
-            return RegisterClassW(&windowClass);
-        }();
-        windows.push_back(CreateWindowExW(0, MAKEINTATOM(atom), L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, nullptr, nullptr));
+        windows.push_back(testsupport::CountingViewWindow());
         return windows.back();
     }
     std::vector<HWND> windows;
@@ -158,7 +144,8 @@ TEST_F(NotifyWindowTest, FolderTellsEachListedViewOnceUnlessRefreshedOrReleased)
     EXPECT_EQ(S_OK, refreshed->EventReceived());
     folders[2].Reset();
     testsupport::PumpMessagesFor(6000);
-    for (HWND hwnd : {a, b, removed, never, refreshedView, releasedView}) { EXPECT_EQ(hwnd == a || hwnd == b, g_viewMessages[hwnd]); }
+    for (HWND hwnd : {a, b, removed, never, refreshedView, releasedView})
+        EXPECT_EQ(hwnd == a || hwnd == b ? 1 : 0, testsupport::ViewMessages()[hwnd]);
     EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl2::EventReceived\r\n"));
     EXPECT_EQ(2u, g_notifications.size()) << "the shell heard once of each brand's root";
 
