@@ -23,30 +23,9 @@ struct FetchRun {
     }
 };
 
-HANDLE OutputFile(const std::wstring& path) {
-    SECURITY_ATTRIBUTES inherit = {sizeof(inherit), nullptr, TRUE};
-    return CreateFileW(path.c_str(), GENERIC_WRITE, FILE_SHARE_READ, &inherit, CREATE_ALWAYS, 0, nullptr);
-}
-
 FetchRun RunFetch(const std::wstring& arguments) {
-    TempDirectory logs(L"calvex-fetch-output");
-    STARTUPINFOW startup = {sizeof(startup)};
-    startup.dwFlags = STARTF_USESTDHANDLES;
-    startup.hStdOutput = OutputFile(logs.Path() + L"\\out.txt");
-    startup.hStdError = OutputFile(logs.Path() + L"\\err.txt");
-    std::wstring commandLine = L"\"" + BuildDir() + L"\\calvex-fetch.exe\" " + arguments;
-    PROCESS_INFORMATION process = {};
     FetchRun run;
-    if (CreateProcessW(nullptr, &commandLine[0], nullptr, nullptr, TRUE, 0, nullptr, nullptr, &startup, &process)) {
-        if (WaitForSingleObject(process.hProcess, 300000) != WAIT_OBJECT_0) TerminateProcess(process.hProcess, 99);
-        GetExitCodeProcess(process.hProcess, &run.exitCode);
-        CloseHandle(process.hThread);
-        CloseHandle(process.hProcess);
-    }
-    CloseHandle(startup.hStdOutput);
-    CloseHandle(startup.hStdError);
-    run.out = ReadFileBytes(logs.Path() + L"\\out.txt");
-    run.err = ReadFileBytes(logs.Path() + L"\\err.txt");
+    run.exitCode = RunProcess(L"\"" + BuildDir() + L"\\calvex-fetch.exe\" " + arguments, 300000, &run.out, &run.err);
     return run;
 }
 

@@ -91,8 +91,9 @@ protected:
         ASSERT_TRUE(receiver) << "receiver " << Narrow(serial);
         for (const TaskPidl& item : ListItems(receiver.Get(), SHCONTF_NONFOLDERS)) {
             LPCITEMIDLIST child = item.get();
-            if (mgr.GetData(child)->name == name)
+            if (mgr.GetData(child)->name == name) {
                 ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, &child, IID_IDataObject, nullptr, data.PutVoid()));
+            }
         }
         ASSERT_TRUE(data) << Narrow(name);
     }
@@ -124,12 +125,10 @@ TEST_F(TransferPasteTest, OneFileOutcomes) {
         TempDirectory target(L"calvex-paste-target");
         ASSERT_EQ(S_OK, OleSetClipboard(data.Get()));
         // calvex-paste's GetData calls come into this thread, and the download dialogs run here.
-        const std::wstring log = target.Path() + L".txt";
         const DWORD started = GetTickCount();
-        const DWORD exitCode = RunProcess(
-            L"cmd /c \"\"" + BuildDir() + L"\\calvex-paste.exe\" \"" + target.Path() + L"\" > \"" + log + L"\" 2>&1\"", 90000);
-        const std::string output = ReadFileBytes(log);
-        DeleteFileW(log.c_str());
+        std::string output;
+        const DWORD exitCode =
+            RunProcess(L"\"" + BuildDir() + L"\\calvex-paste.exe\" \"" + target.Path() + L"\"", 90000, &output, &output);
         EXPECT_EQ(c.arrives ? 0u : 1u, exitCode) << output;
         EXPECT_LT(GetTickCount() - started, c.withinMs) << "no hang; a cancel ends the download early";
         EXPECT_EQ(c.boxes, Count(output, "message box:")) << output;

@@ -38,15 +38,40 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds) {
     }
 }
 
-DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds) {
+// An inheritable file that takes a child's output; read into text and deleted at the end.
+struct OutputCapture {
+    explicit OutputCapture(std::string* text) : text(text) {
+        wchar_t dir[MAX_PATH] = L"", name[MAX_PATH] = L"";
+        if (!text || !GetTempPathW(MAX_PATH, dir) || !GetTempFileNameW(dir, L"out", 0, name)) return;
+        path = name;
+        SECURITY_ATTRIBUTES inherit = {sizeof inherit, nullptr, TRUE};
+        file.Reset(CreateFileW(name, GENERIC_WRITE, FILE_SHARE_READ, &inherit, CREATE_ALWAYS, 0, nullptr));
+    }
+    ~OutputCapture() {
+        file.Reset();
+        if (text) *text = ReadFileBytes(path);
+        if (!path.empty()) DeleteFileW(path.c_str());
+    }
+    std::string* text;
+    std::wstring path;
+    UniqueFile file;
+};
+
+DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds, std::string* out, std::string* err) {
+    OutputCapture output(out), errors(err == out ? nullptr : err);  // one file when both go to one text
     STARTUPINFOW startup = {sizeof startup};
+    if (out || err) startup.dwFlags = STARTF_USESTDHANDLES;
+    startup.hStdOutput = output.file.Get();
+    startup.hStdError = err == out ? output.file.Get() : errors.file.Get();
     PROCESS_INFORMATION process = {};
-    if (!CreateProcessW(nullptr, &commandLine[0], nullptr, nullptr, FALSE, 0, nullptr, nullptr, &startup, &process))
+    if (!CreateProcessW(nullptr, &commandLine[0], nullptr, nullptr, out || err, 0, nullptr, nullptr, &startup, &process))
         return GetLastError();
     UniqueHandle thread(process.hThread), owned(process.hProcess);
     DWORD exitCode = WAIT_TIMEOUT;
     if (PumpUntil([&] { return WaitForSingleObject(process.hProcess, 0) == WAIT_OBJECT_0; }, timeoutMilliseconds))
         GetExitCodeProcess(process.hProcess, &exitCode);
+    else
+        TerminateProcess(process.hProcess, WAIT_TIMEOUT);
     return exitCode;
 }
 

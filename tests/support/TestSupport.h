@@ -21,8 +21,10 @@ void PumpMessagesFor(DWORD milliseconds);
 bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
 
 // Runs a command line to its end, dispatching this thread's messages meanwhile (a server
-// that is quitting may call back into it). The exit code, or the error that stopped it.
-DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000);
+// that is quitting may call back into it). The exit code, or the error that stopped it; what
+// it wrote to its standard output and error when out and err are given.
+DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000, std::string* out = nullptr,
+                 std::string* err = nullptr);
 
 // A file's bytes, also while another holds it open for writing; empty when it cannot be read.
 std::string ReadFileBytes(const std::wstring& path);

