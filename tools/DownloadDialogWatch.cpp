@@ -2,12 +2,13 @@
 
 #include <commctrl.h>
 
+#include "resources/resource.h"
+
 namespace {
-constexpr int ProgressBarId = 212;
 constexpr UINT TickMs = 100;
 
 BOOL CALLBACK FindDialog(HWND window, LPARAM found) {
-    if (!GetDlgItem(window, ProgressBarId) || !IsWindowVisible(window)) return TRUE;
+    if (!GetDlgItem(window, IDC_PROGRESS_BAR) || !IsWindowVisible(window)) return TRUE;
     *reinterpret_cast<HWND*>(found) = window;
     return FALSE;
 }
@@ -32,7 +33,7 @@ void CALLBACK DownloadDialogWatch::OnTimer(HWND, UINT, UINT_PTR, DWORD) {
     EnumThreadWindows(GetCurrentThreadId(), FindDialog, reinterpret_cast<LPARAM>(&dialog));
     s_dialog = dialog;
     if (!dialog || !s_current) return;
-    s_current->m_tick(static_cast<int>(SendDlgItemMessageW(dialog, ProgressBarId, PBM_GETPOS, 0, 0)));
+    s_current->m_tick(static_cast<int>(SendDlgItemMessageW(dialog, IDC_PROGRESS_BAR, PBM_GETPOS, 0, 0)));
 }
 
 bool DownloadDialogWatch::CancelRunningDialog() {

@@ -2,11 +2,11 @@
 
 #include <iterator>
 
+#include "resources/resource.h"
+
 namespace {
 constexpr DWORD PollMs = 100;
-constexpr int MessageTextId = 0xFFFF;   // the static text of a message box
-constexpr int ProgressBarId = 212;      // the product's download dialog
-constexpr int ProgressStatusId = 211;
+constexpr int MessageTextId = 0xFFFF;  // the static text of a message box
 
 bool IsDialog(HWND window) {
     wchar_t className[16] = L"";
@@ -57,7 +57,7 @@ bool MessageBoxAnswerer::IsOurs(HWND box) const {
     GetWindowThreadProcessId(box, &process);
     if (process == GetCurrentProcessId()) return true;
     const HWND owner = GetWindow(box, GW_OWNER);
-    return owner && GetDlgItem(owner, ProgressBarId) && GetDlgItem(owner, ProgressStatusId);
+    return owner && GetDlgItem(owner, IDC_PROGRESS_BAR) && GetDlgItem(owner, IDC_PROGRESS_STATUS);
 }
 
 void MessageBoxAnswerer::Answer(HWND box) {

@@ -71,8 +71,7 @@ TEST_F(ReceiverLoadTest, BurstOfAThousandFileEventsGivesOneNotificationAndFewRef
     ASSERT_TRUE(PumpUntil([&] { return view.Count() == 1001; }, 60000)) << view.Count();
     PumpMessagesFor(8000);
 
-    const std::wstring path =
-        L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E102076F-4057-4e7f-8209-511258F12B62}\\1000-0001!Q9 GNSS!USB";
+    const std::wstring path = kCalvexRootPath + L"\\1000-0001!Q9 GNSS!USB";
     EXPECT_GE(CountTrace("CCalvexFilesShellFolderEventHandler::OnFileAdded\r\n"), 1000u) << "every event arrived";
     EXPECT_EQ((std::map<std::wstring, int>{{path, 1}}), g_notified);
     const size_t fills = CountTrace(fill) - fillsBefore;
