@@ -2,6 +2,7 @@
 #include <windows.h>
 
 #include <cwchar>
+#include <cstring>
 #include <string>
 
 #include <gtest/gtest.h>
@@ -29,7 +30,9 @@ std::wstring Value(const std::wstring& sub, const wchar_t* name) {
     if (RegGetValueW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), name,
                      RRF_RT_REG_SZ | RRF_RT_REG_DWORD, &type, text, &size))
         return L"<none>";
-    if (type == REG_DWORD) swprintf(text, 512, L"0x%08X", *reinterpret_cast<DWORD*>(text));
+    DWORD value = 0;
+    memcpy(&value, text, sizeof value);  // the buffer holds the DWORD's bytes: no aliasing cast
+    if (type == REG_DWORD) swprintf(text, 512, L"0x%08X", value);
     return text;
 }
 
