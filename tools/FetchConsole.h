@@ -10,6 +10,8 @@ class FetchConsole {
 public:
     FetchConsole();
     bool IsTerminal() const { return m_terminal; }
+    // Every later line starts with the local time, for a console left open all day.
+    void SetStamped(bool stamped) { m_stamped = stamped; }
     void Line(const std::wstring& text);
     void Error(const std::wstring& text);  // "calvex-fetch: " + text on stderr
     // Redraws the file's progress bar in place; nothing when stdout is not a terminal.
@@ -22,6 +24,7 @@ private:
     std::mutex m_lock;
     HANDLE m_out;
     bool m_terminal;
+    bool m_stamped = false;
     size_t m_progressWidth = 0;  // characters of the bar line on screen, 0 when none
 };
 

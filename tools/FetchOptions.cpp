@@ -2,7 +2,8 @@
 
 const wchar_t kFetchUsage[] =
     L"usage: calvex-fetch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--all | --new] "
-    L"[--dry-run] TARGET\n";
+    L"[--dry-run] TARGET\n"
+    L"       calvex-fetch --watch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... TARGET\n";
 
 namespace {
 bool Fail(std::wstring& error, const std::wstring& reason) {
@@ -35,6 +36,8 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
             newOnly = true;
         } else if (argument == L"--dry-run") {
             options.dryRun = true;
+        } else if (argument == L"--watch") {
+            options.watch = true;
         } else if (argument.size() > 1 && argument[0] == L'-') {
             return Fail(error, L"unknown option " + argument);
         } else if (!options.target.empty()) {
@@ -44,6 +47,9 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
         }
     }
     if (options.all && newOnly) return Fail(error, L"--all and --new exclude each other");
+    // A watch fetches only what is new, for real: anything else would fetch forever or nothing.
+    if (options.watch && (options.all || options.dryRun))
+        return Fail(error, std::wstring(L"--watch and ") + (options.all ? L"--all" : L"--dry-run") + L" exclude each other");
     if (options.target.empty()) return Fail(error, L"no TARGET folder given");
     return true;
 }

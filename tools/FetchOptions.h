@@ -9,6 +9,7 @@ struct FetchOptions {
     std::vector<std::wstring> receivers;  // keys or display names; empty: every receiver
     bool all = false;      // fetch again what is already there
     bool dryRun = false;
+    bool watch = false;    // keep running and fetch what receivers bring, as it comes
     std::wstring target;   // as given; made absolute by the caller
 };
 

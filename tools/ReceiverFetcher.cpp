@@ -4,17 +4,12 @@
 
 #include "DescriptorName.h"
 #include "DownloadDialogWatch.h"
+#include "ReceiverList.h"
 #include "ShellNamespace.h"
 #include "VirtualFiles.h"
 #include "com/ComPtr.h"
 
 namespace {
-std::wstring HexText(HRESULT hr) {
-    wchar_t text[16];
-    swprintf(text, 16, L"0x%08X", static_cast<unsigned>(hr));
-    return text;
-}
-
 ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
     return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
 }
@@ -32,8 +27,9 @@ void ReceiverFetcher::Run(IShellFolder* receiver, const std::wstring& targetDir)
     HRESULT hr = S_OK;
     std::vector<OwnedItem> files = ShellChildren(receiver, SHCONTF_NONFOLDERS, &hr);
     if (FAILED(hr)) Fail(L"(file list)", L"the receiver's files cannot be listed (" + HexText(hr) + L")");
+    const int failedBefore = m_totals.failed;
     for (const OwnedItem& file : files) {
-        if (m_interrupted) return;
+        if (m_interrupted || (m_givenUp && m_totals.failed > failedBefore)) return;
         FetchItem(receiver, file.get(), targetDir);
     }
 }
@@ -49,12 +45,14 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item, co
     }
     const FILEDESCRIPTORW& descriptor = descriptors[0];
     const std::wstring name = descriptor.cFileName;
+    if (m_givenUp && m_givenUp->count(name)) return;
     const SafeName safe = MakeSafeDescriptorName(name, targetDir.size());
     if (safe.refused) return Fail(name, L"refused name: " + safe.reason);
-    const std::wstring shown = safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")";
+    const std::wstring shown = m_shownFolder + (safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")");
     if (!m_options.all && IsAlreadyFetched(targetDir + L"\\" + safe.name, descriptor)) {
         ++m_totals.skipped;
-        return m_console.Line(L"  up to date  " + shown);
+        // A watch compares again at every event: only news is worth a line there.
+        return m_options.watch ? void() : m_console.Line(L"  up to date  " + shown);
     }
     if (m_options.dryRun) {
         ++m_totals.fetched;
@@ -62,7 +60,11 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item, co
         return m_console.Line(L"  would fetch " + shown + L"  " + ByteText(DescriptorSize(descriptor)));
     }
     std::wstring error;
-    if (!Download(data.Get(), descriptor, name, targetDir, error)) return Fail(name, error);
+    if (!Download(data.Get(), descriptor, name, targetDir, error)) {
+        // Stopped by the user: nothing failed, the file simply was not kept.
+        if (m_interrupted) return m_console.Line(L"  discarded   " + m_shownFolder + name + L" (stopped)");
+        return Fail(name, error);
+    }
     ++m_totals.fetched;
     m_totals.bytes += DescriptorSize(descriptor);
     m_console.Line(L"  fetched     " + shown + L"  " + ByteText(DescriptorSize(descriptor)));
@@ -86,9 +88,7 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
     }
     if (hr != S_OK || !stream) {
         // S_FALSE: the product's dialog ended without the file (failed or cancelled).
-        error = m_interrupted ? L"interrupted"
-                : hr == S_FALSE ? L"download failed or cancelled"
-                                : L"no contents (" + HexText(hr) + L")";
+        error = hr == S_FALSE ? L"download failed or cancelled" : L"no contents (" + HexText(hr) + L")";
         return false;
     }
     return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));
@@ -96,5 +96,6 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
 
 void ReceiverFetcher::Fail(const std::wstring& name, const std::wstring& reason) {
     ++m_totals.failed;
-    m_console.Line(L"  FAILED      " + name + L": " + reason);
+    if (m_givenUp) m_givenUp->insert(name);
+    m_console.Line(L"  FAILED      " + m_shownFolder + name + L": " + reason);
 }

@@ -6,6 +6,7 @@
 #include <shlobj.h>
 
 #include <atomic>
+#include <set>
 #include <string>
 
 #include "FetchConsole.h"
@@ -26,6 +27,13 @@ public:
 
     // Every file of the receiver's folder into targetDir (made when something is fetched).
     void Run(IShellFolder* receiver, const std::wstring& targetDir);
+    // For a watch, whose lines mix receivers: each file is shown below folderName (the
+    // receiver's folder in the target); the names in givenUp are left alone, every file that
+    // fails joins them, and a run stops at its first failure (the receiver may be gone).
+    void Watching(const std::wstring& folderName, std::set<std::wstring>* givenUp) {
+        m_shownFolder = folderName + L"\\";
+        m_givenUp = givenUp;
+    }
 
 private:
     void FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item, const std::wstring& targetDir);
@@ -38,6 +46,8 @@ private:
     FetchConsole& m_console;
     FetchTotals& m_totals;
     const std::atomic<bool>& m_interrupted;
+    std::wstring m_shownFolder;
+    std::set<std::wstring>* m_givenUp = nullptr;
 };
 
 // True when path holds a file of the descriptor's size and last-write time.

@@ -8,17 +8,26 @@ const wchar_t* const kBrandFolderPaths[2] = {
     L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}",
 };
 
-HRESULT BindShellPath(const std::wstring& path, ComPtr<IShellFolder>& folder) {
-    folder.Reset();
+HRESULT ParseShellPath(const std::wstring& path, OwnedItem& item) {
+    item.reset();
     ComPtr<IShellFolder> desktop;
     HRESULT hr = SHGetDesktopFolder(&desktop);
     if (FAILED(hr)) return hr;
     LPITEMIDLIST parsed = nullptr;
     std::wstring text = path;
     hr = desktop->ParseDisplayName(nullptr, nullptr, &text[0], nullptr, &parsed, nullptr);
+    if (SUCCEEDED(hr)) item.reset(parsed);
+    return hr;
+}
+
+HRESULT BindShellPath(const std::wstring& path, ComPtr<IShellFolder>& folder) {
+    folder.Reset();
+    ComPtr<IShellFolder> desktop;
+    OwnedItem item;
+    HRESULT hr = SHGetDesktopFolder(&desktop);
+    if (SUCCEEDED(hr)) hr = ParseShellPath(path, item);
     if (FAILED(hr)) return hr;
-    OwnedItem owned(parsed);
-    return desktop->BindToObject(owned.get(), nullptr, IID_IShellFolder, folder.PutVoid());
+    return desktop->BindToObject(item.get(), nullptr, IID_IShellFolder, folder.PutVoid());
 }
 
 std::vector<OwnedItem> ShellChildren(IShellFolder* folder, SHCONTF flags, HRESULT* result) {

@@ -19,7 +19,9 @@ struct OwnedItemFree {
 };
 using OwnedItem = std::unique_ptr<ITEMIDLIST, OwnedItemFree>;
 
-// SHGetDesktopFolder()->ParseDisplayName, then BindToObject.
+// SHGetDesktopFolder()->ParseDisplayName: the absolute item identifier of a path.
+HRESULT ParseShellPath(const std::wstring& path, OwnedItem& item);
+// ParseShellPath, then BindToObject.
 HRESULT BindShellPath(const std::wstring& path, ComPtr<IShellFolder>& folder);
 // The folder's items of the given kinds; EnumObjects' failure where asked for.
 std::vector<OwnedItem> ShellChildren(IShellFolder* folder, SHCONTF flags, HRESULT* result = nullptr);

@@ -2,7 +2,8 @@
 // namespace that the user browses (see the README for the options and an example run).
 //
 // Exit code: 0 all good, 1 some files failed, 2 nothing could be done (no device manager, no
-// such receiver, target not writable, bad arguments).
+// such receiver, target not writable, bad arguments). With --watch (ReceiverWatch.h) it runs
+// until stopped: 0 or 1 as above, 2 also when the device manager goes away.
 #include <windows.h>
 #include <ole2.h>
 
@@ -16,31 +17,26 @@
 #include "FetchOptions.h"
 #include "MessageBoxAnswerer.h"
 #include "ReceiverFetcher.h"
+#include "ReceiverList.h"
+#include "ReceiverWatch.h"
 #include "ShellNamespace.h"
 
 namespace {
-// The device manager's class, asked for only to say why no receiver was listed.
-const CLSID kDeviceManagerClass = {0x0FADF314, 0xB4FD, 0x413C, {0x9E, 0x26, 0x6B, 0xC4, 0x9B, 0x06, 0x60, 0x80}};
-const wchar_t* const kBrandNames[2] = {L"Calvex", L"Brennor"};
-
 const wchar_t kNoReceiver[] = L"no receiver is connected";
 
 std::atomic<bool> g_interrupted{false};
-
-struct Receiver {
-    std::wstring brand;
-    std::wstring display;  // model "@" port, as Explorer shows it
-    std::wstring key;      // the parsing name: serial "!" model "!" port
-    ComPtr<IShellFolder> parent;
-    OwnedItem item;
-};
+HANDLE g_stop = nullptr;      // set when the user stops the tool
+HANDLE g_finished = nullptr;  // set once the summary is out
 
 // Ctrl+C cancels the running download through its dialog, as the user would; no file that
-// looks complete is left, and the summary is still printed.
+// looks complete is left, and the summary is still printed. Closing the console ends the
+// process as soon as this returns, so that waits (briefly) until the tool has wound up.
 BOOL WINAPI OnConsoleControl(DWORD event) {
-    if (event != CTRL_C_EVENT && event != CTRL_BREAK_EVENT) return FALSE;
     g_interrupted = true;
     DownloadDialogWatch::CancelRunningDialog();
+    SetEvent(g_stop);
+    if (event == CTRL_CLOSE_EVENT || event == CTRL_LOGOFF_EVENT || event == CTRL_SHUTDOWN_EVENT)
+        WaitForSingleObject(g_finished, 4000);
     return TRUE;
 }
 
@@ -63,27 +59,6 @@ bool IsWritableFolder(const std::wstring& target) {
     return true;
 }
 
-HRESULT ListReceivers(const FetchOptions& options, std::vector<Receiver>& receivers) {
-    const bool wanted[2] = {options.calvex, options.brennor};
-    for (int brand = 0; brand < 2; ++brand) {
-        if (!wanted[brand]) continue;
-        ComPtr<IShellFolder> folder;
-        const HRESULT hr = BindShellPath(kBrandFolderPaths[brand], folder);
-        if (FAILED(hr)) return hr;
-        for (OwnedItem& item : ShellChildren(folder.Get(), SHCONTF_FOLDERS)) {
-            Receiver receiver{kBrandNames[brand], ShellName(folder.Get(), item.get(), SHGDN_NORMAL),
-                              ShellName(folder.Get(), item.get(), SHGDN_INFOLDER | SHGDN_FORPARSING), folder,
-                              std::move(item)};
-            receivers.push_back(std::move(receiver));
-        }
-    }
-    return S_OK;
-}
-
-bool Matches(const Receiver& receiver, const std::wstring& wanted) {
-    return lstrcmpiW(receiver.key.c_str(), wanted.c_str()) == 0 || lstrcmpiW(receiver.display.c_str(), wanted.c_str()) == 0;
-}
-
 // The receivers that the options name, in listing order; false with the first unknown name.
 bool Select(const FetchOptions& options, std::vector<Receiver>& receivers, std::wstring& unknown) {
     for (const std::wstring& wanted : options.receivers) {
@@ -93,37 +68,24 @@ bool Select(const FetchOptions& options, std::vector<Receiver>& receivers, std::
         unknown = wanted;
         return false;
     }
-    if (options.receivers.empty()) return true;
     std::vector<Receiver> chosen;
-    for (Receiver& receiver : receivers) {
-        for (const std::wstring& wanted : options.receivers) {
-            if (!Matches(receiver, wanted)) continue;
-            chosen.push_back(std::move(receiver));
-            break;
-        }
-    }
+    for (Receiver& receiver : receivers)
+        if (IsWanted(options, receiver)) chosen.push_back(std::move(receiver));
     receivers.swap(chosen);
     return true;
 }
 
 // Why nothing was listed: the device manager cannot be reached, or no receiver is connected.
 std::wstring WhyNoReceivers() {
-    IUnknown* manager = nullptr;
-    const HRESULT hr = CoCreateInstance(kDeviceManagerClass, nullptr, CLSCTX_LOCAL_SERVER, IID_IUnknown,
-                                        reinterpret_cast<void**>(&manager));
-    if (FAILED(hr)) {
-        wchar_t text[96];
-        swprintf(text, 96, L"no device manager: it cannot be started (0x%08X)", static_cast<unsigned>(hr));
-        return text;
-    }
-    manager->Release();
-    return kNoReceiver;
+    ComPtr<IDispatch> manager;
+    const HRESULT hr = ConnectDeviceManager(manager);
+    return FAILED(hr) ? L"no device manager: it cannot be started (" + HexText(hr) + L")" : kNoReceiver;
 }
 
 void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options, FetchConsole& console,
                    FetchTotals& totals) {
     const SafeName folder = MakeSafeFolderName(receiver.display, target.size());
-    std::wstring header = receiver.brand + L" " + receiver.display + L" (" + receiver.key + L")";
+    const std::wstring header = receiver.Title();
     if (folder.refused) {
         ++totals.failed;
         return console.Line(header + L": FAILED, no folder name: " + folder.reason);
@@ -152,6 +114,10 @@ int Fetch(const FetchOptions& options, FetchConsole& console) {
     if (!options.dryRun && !IsWritableFolder(target)) {
         console.Error(L"target not writable: " + target);
         return 2;
+    }
+    if (options.watch) {
+        console.SetStamped(true);
+        return ReceiverWatch(options, target, console, g_interrupted, g_stop).Run();
     }
     std::vector<Receiver> receivers;
     const HRESULT hr = ListReceivers(options, receivers);
@@ -195,6 +161,8 @@ int wmain(int argc, wchar_t** argv) {
         return 2;
     }
     if (FAILED(OleInitialize(nullptr))) return 2;
+    g_stop = CreateEventW(nullptr, TRUE, FALSE, nullptr);
+    g_finished = CreateEventW(nullptr, TRUE, FALSE, nullptr);
     SetConsoleCtrlHandler(OnConsoleControl, TRUE);
     int result;
     {
@@ -205,6 +173,7 @@ int wmain(int argc, wchar_t** argv) {
         });
         result = Fetch(options, console);
     }
+    SetEvent(g_finished);
     OleUninitialize();
     return result;
 }

@@ -1,0 +1,221 @@
+#include "ReceiverWatch.h"
+
+#include <cstdio>
+#include <vector>
+
+#include "DescriptorName.h"
+
+namespace {
+// How often the device manager is asked whether it is still there (the product's download
+// dialog asks as often), and how often everything is compared in case a notification was lost.
+constexpr ULONGLONG kLivenessMs = 2000;
+constexpr ULONGLONG kRescanMs = 60000;
+
+std::wstring WatchId(int brand, const std::wstring& key) { return std::to_wstring(brand) + L"|" + key; }
+int BrandOf(const std::wstring& id) { return id[0] - L'0'; }
+
+std::wstring Duration(ULONGLONG milliseconds) {
+    wchar_t text[32];
+    if (milliseconds < 60000) swprintf(text, 32, L"%.1f s", milliseconds / 1000.0);
+    else if (milliseconds < 3600000) swprintf(text, 32, L"%.1f min", milliseconds / 60000.0);
+    else swprintf(text, 32, L"%.1f h", milliseconds / 3600000.0);
+    return text;
+}
+}  // namespace
+
+ReceiverWatch::ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
+                             const std::atomic<bool>& interrupted, HANDLE stop)
+    : m_options(options), m_target(target), m_console(console), m_interrupted(interrupted), m_stop(stop),
+      m_listener([this](LONG, PCIDLIST_ABSOLUTE item) { OnChange(item); }) {}
+
+int ReceiverWatch::Run() {
+    if (!Start()) return 2;
+    m_started = GetTickCount64();
+    ULONGLONG nextProbe = m_started + kLivenessMs, nextRescan = m_started + kRescanMs;
+    while (!m_interrupted && !m_gone) {
+        while (AnyDirty() && !m_interrupted && !m_gone) ProcessDirty();
+        m_plugging = true;
+        const ULONGLONG now = GetTickCount64();
+        if (now >= nextProbe) {
+            DeviceManagerGone();
+            nextProbe = now + kLivenessMs;
+        }
+        if (now >= nextRescan) {
+            for (int brand = 0; brand < 2; ++brand) m_brandDirty[brand] = static_cast<bool>(m_brands[brand]);
+            for (auto& entry : m_watched) entry.second.dirty = true;
+            nextRescan = now + kRescanMs;
+        }
+        if (!AnyDirty()) WaitForWork(static_cast<DWORD>((nextProbe < nextRescan ? nextProbe : nextRescan) - now));
+    }
+    m_console.Line(Summary());
+    if (m_gone) return 2;
+    return m_totals.failed ? 1 : 0;
+}
+
+bool ReceiverWatch::Start() {
+    HRESULT hr = ConnectDeviceManager(m_manager);
+    if (FAILED(hr)) {
+        m_console.Error(L"no device manager: it cannot be started (" + HexText(hr) + L")");
+        return false;
+    }
+    const bool wanted[2] = {m_options.calvex, m_options.brennor};
+    std::vector<PCIDLIST_ABSOLUTE> folders;
+    std::wstring names;
+    for (int brand = 0; brand < 2; ++brand) {
+        if (!wanted[brand]) continue;
+        hr = BindShellPath(kBrandFolderPaths[brand], m_brands[brand]);
+        if (SUCCEEDED(hr)) hr = ParseShellPath(kBrandFolderPaths[brand], m_brandItems[brand]);
+        if (FAILED(hr)) {
+            m_console.Error(L"the receivers folders cannot be opened: is the extension registered?");
+            return false;
+        }
+        folders.push_back(m_brandItems[brand].get());
+        names += (names.empty() ? L"" : L" and ") + std::wstring(kBrandNames[brand]);
+        m_brandDirty[brand] = true;
+    }
+    hr = m_listener.Start(folders);
+    if (FAILED(hr)) {
+        m_console.Error(L"the shell's change notifications cannot be registered (" + HexText(hr) + L")");
+        return false;
+    }
+    m_console.Line(L"watching the " + names + L" receivers, new files into " + m_target + L" (Ctrl+C stops)");
+    return true;
+}
+
+// From a message handler, possibly inside a download's modal loop: only marks what to look at.
+void ReceiverWatch::OnChange(PCIDLIST_ABSOLUTE item) {
+    for (int brand = 0; brand < 2; ++brand) {
+        PCUIDLIST_RELATIVE rest = nullptr;
+        if (!m_brands[brand] || !PrefixRest(item, m_brandItems[brand].get(), &rest)) continue;
+        if (ILIsEmpty(rest)) {
+            m_brandDirty[brand] = true;
+            return;
+        }
+        OwnedItem child(ILCloneFirst(rest));
+        const std::wstring key = child ? ShellName(m_brands[brand].Get(), child.get(), SHGDN_INFOLDER | SHGDN_FORPARSING) : L"";
+        auto found = m_watched.find(WatchId(brand, key));
+        if (found != m_watched.end()) found->second.dirty = true;
+        else m_brandDirty[brand] = true;  // a receiver not watched yet: plugged in
+        return;
+    }
+}
+
+bool ReceiverWatch::AnyDirty() const {
+    if (m_brandDirty[0] || m_brandDirty[1]) return true;
+    for (const auto& entry : m_watched)
+        if (entry.second.dirty) return true;
+    return false;
+}
+
+void ReceiverWatch::ProcessDirty() {
+    for (int brand = 0; brand < 2 && !m_interrupted && !m_gone; ++brand) {
+        if (!m_brandDirty[brand]) continue;
+        m_brandDirty[brand] = false;
+        ScanBrand(brand);
+    }
+    std::vector<std::wstring> ids;
+    for (auto& entry : m_watched)
+        if (entry.second.dirty) ids.push_back(entry.first);
+    for (const std::wstring& id : ids) {
+        if (m_interrupted || m_gone) return;
+        FetchNew(id);
+    }
+}
+
+void ReceiverWatch::ScanBrand(int brand) {
+    // A device manager that is gone lists nothing: that must not read as every receiver unplugged.
+    if (DeviceManagerGone()) return;
+    HRESULT hr = S_OK;
+    std::vector<Receiver> listed = BrandReceivers(m_brands[brand].Get(), brand, &hr);
+    if (FAILED(hr)) return;  // nothing learnt; the next event or rescan asks again
+    std::set<std::wstring> present;
+    for (Receiver& receiver : listed) {
+        if (!IsWanted(m_options, receiver)) continue;
+        const std::wstring id = WatchId(brand, receiver.key);
+        present.insert(id);
+        if (!m_watched.count(id)) Add(std::move(receiver), brand);
+    }
+    for (auto entry = m_watched.begin(); entry != m_watched.end();) {
+        if (BrandOf(entry->first) != brand || present.count(entry->first)) {
+            ++entry;
+            continue;
+        }
+        m_console.Line(entry->second.receiver.Title() + L" unplugged");
+        entry = m_watched.erase(entry);
+    }
+}
+
+void ReceiverWatch::Add(Receiver receiver, int brand) {
+    const std::wstring title = receiver.Title() + (m_plugging ? L" plugged in" : L"");
+    const SafeName folder = MakeSafeFolderName(receiver.display, m_target.size());
+    Watched watched;
+    if (folder.refused) {
+        ++m_totals.failed;
+        m_console.Line(title + L": FAILED, no folder name: " + folder.reason);
+        watched.dirty = false;  // left alone until plugged in again
+    } else if (FAILED(receiver.parent->BindToObject(receiver.item.get(), nullptr, IID_IShellFolder,
+                                                    watched.files.PutVoid()))) {
+        ++m_totals.failed;
+        m_console.Line(title + L": FAILED, the receiver cannot be opened");
+        watched.dirty = false;
+    } else {
+        watched.folder = folder.name;
+        m_console.Line(title + L" -> " + m_target + L"\\" + folder.name);
+    }
+    const std::wstring id = WatchId(brand, receiver.key);
+    watched.receiver = std::move(receiver);
+    m_watched.emplace(id, std::move(watched));
+}
+
+void ReceiverWatch::FetchNew(const std::wstring& id) {
+    auto found = m_watched.find(id);
+    if (found == m_watched.end()) return;
+    Watched& watched = found->second;
+    watched.dirty = false;
+    FetchTotals pass;
+    ReceiverFetcher fetcher(m_options, m_console, pass, m_interrupted);
+    fetcher.Watching(watched.folder, &watched.givenUp);
+    fetcher.Run(watched.files.Get(), m_target + L"\\" + watched.folder);
+    if (pass.failed && !m_gone && !IsListed(watched, BrandOf(id))) {
+        // Cut by the unplug: what is missing is fetched when the receiver is back.
+        m_console.Line(watched.receiver.Title() + L" unplugged; what it had not sent comes when it is back");
+        m_watched.erase(found);
+        pass.failed = 0;
+    } else if (pass.failed) {
+        watched.dirty = true;  // the run stopped at the failure: on with the other files
+    }
+    m_totals.fetched += pass.fetched;
+    m_totals.failed += pass.failed;
+    m_totals.bytes += pass.bytes;
+}
+
+bool ReceiverWatch::IsListed(const Watched& watched, int brand) {
+    if (DeviceManagerGone()) return false;
+    for (const Receiver& receiver : BrandReceivers(m_brands[brand].Get(), brand))
+        if (receiver.key == watched.receiver.key) return true;
+    return false;
+}
+
+bool ReceiverWatch::DeviceManagerGone() {
+    if (m_gone) return true;
+    const HRESULT hr = AskDeviceManager(m_manager.Get());
+    if (!IsServerGone(hr)) return false;
+    m_gone = true;
+    m_console.Error(L"the device manager is gone (" + HexText(hr) + L"): no receiver can be watched any more");
+    return true;
+}
+
+void ReceiverWatch::WaitForWork(DWORD milliseconds) {
+    MsgWaitForMultipleObjects(1, &m_stop, FALSE, milliseconds, QS_ALLINPUT);
+    MSG message;
+    while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) {
+        TranslateMessage(&message);
+        DispatchMessageW(&message);
+    }
+}
+
+std::wstring ReceiverWatch::Summary() const {
+    return L"watch ended: " + std::to_wstring(m_totals.fetched) + L" fetched, " + std::to_wstring(m_totals.failed) +
+           L" failed, " + ByteText(m_totals.bytes) + L" in " + Duration(GetTickCount64() - m_started) +
+           (m_interrupted ? L" (stopped)" : L"");
+}

@@ -1,0 +1,67 @@
+#pragma once
+// calvex-fetch --watch: first every new file of every receiver, as a batch fetches them; then,
+// until stopped, whatever a receiver brings when it is plugged in or logs a file. It learns of
+// both from the shell's change notifications (with a slow rescan as a safety net), and does
+// all its work on this one thread, outside the message handlers, one receiver at a time: a
+// burst of notifications only marks receivers to look at, so no file is fetched twice.
+#include <windows.h>
+#include <shlobj.h>
+
+#include <atomic>
+#include <map>
+#include <set>
+#include <string>
+
+#include "FetchConsole.h"
+#include "FetchOptions.h"
+#include "ReceiverFetcher.h"
+#include "ReceiverList.h"
+#include "ShellChangeListener.h"
+
+class ReceiverWatch {
+public:
+    // interrupted and stop are set by the console's Ctrl+C handler.
+    ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
+                  const std::atomic<bool>& interrupted, HANDLE stop);
+
+    // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start or
+    // the device manager went away (the reason on stderr).
+    int Run();
+
+private:
+    struct Watched {
+        Receiver receiver;
+        ComPtr<IShellFolder> files;  // bound: the folder then follows the receiver's file events
+        std::wstring folder;  // below the target
+        bool dirty = true;
+        std::set<std::wstring> givenUp;  // failed while plugged in this time
+    };
+
+    bool Start();
+    void OnChange(PCIDLIST_ABSOLUTE item);
+    bool AnyDirty() const;
+    void ProcessDirty();
+    void ScanBrand(int brand);
+    void Add(Receiver receiver, int brand);
+    void FetchNew(const std::wstring& id);
+    bool IsListed(const Watched& watched, int brand);
+    bool DeviceManagerGone();
+    void WaitForWork(DWORD milliseconds);
+    std::wstring Summary() const;
+
+    const FetchOptions& m_options;
+    const std::wstring m_target;
+    FetchConsole& m_console;
+    const std::atomic<bool>& m_interrupted;
+    HANDLE m_stop;
+    ShellChangeListener m_listener;
+    ComPtr<IDispatch> m_manager;
+    ComPtr<IShellFolder> m_brands[2];
+    OwnedItem m_brandItems[2];
+    bool m_brandDirty[2] = {};
+    bool m_plugging = false;  // after the first scan, a new receiver has been plugged in
+    bool m_gone = false;
+    std::map<std::wstring, Watched> m_watched;  // by brand and key
+    FetchTotals m_totals;
+    ULONGLONG m_started = 0;
+};
