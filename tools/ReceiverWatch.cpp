@@ -78,7 +78,11 @@ bool ReceiverWatch::Start() {
         m_console.Error(L"the shell's change notifications cannot be registered (" + HexText(hr) + L")");
         return false;
     }
-    m_console.Line(L"watching the " + names + L" receivers, new files into " + m_target + L" (Ctrl+C stops)");
+    std::wstring only;
+    for (const std::wstring& wanted : m_options.receivers) only += (only.empty() ? L" (only " : L", ") + wanted;
+    if (!only.empty()) only += L")";
+    m_console.Line(L"watching the " + names + L" receivers" + only + L", new files into " + m_target +
+                   L" (Ctrl+C stops)");
     return true;
 }
 
