@@ -58,11 +58,6 @@ HRESULT AskDeviceManager(IDispatch* manager) {
     return hr;
 }
 
-bool IsServerGone(HRESULT hr) {
-    return hr == RPC_E_DISCONNECTED || hr == HRESULT_FROM_WIN32(RPC_S_SERVER_UNAVAILABLE) ||
-           hr == CO_E_OBJNOTCONNECTED || hr == RPC_E_SERVER_DIED || hr == RPC_E_SERVER_DIED_DNE;
-}
-
 std::wstring HexText(HRESULT hr) {
     wchar_t text[16];
     swprintf(text, 16, L"0x%08X", static_cast<unsigned>(hr));

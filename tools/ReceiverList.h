@@ -10,6 +10,7 @@
 #include "FetchOptions.h"
 #include "ShellNamespace.h"
 #include "com/ComPtr.h"
+#include "com/ServerGone.h"
 
 extern const wchar_t* const kBrandNames[2];
 
@@ -36,8 +37,5 @@ bool IsWanted(const FetchOptions& options, const Receiver& receiver);
 HRESULT ConnectDeviceManager(ComPtr<IDispatch>& manager);
 // Asks the device manager for its receivers: a real round trip to its process.
 HRESULT AskDeviceManager(IDispatch* manager);
-// Results by which a call learns that the device manager's process is gone; a living but
-// slow one never gives these.
-bool IsServerGone(HRESULT hr);
 // "0x8007001F"
 std::wstring HexText(HRESULT hr);

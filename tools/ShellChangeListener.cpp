@@ -6,19 +6,11 @@ namespace {
 const wchar_t kClassName[] = L"calvex-fetch change listener";
 constexpr UINT kNotifyMessage = WM_APP + 17;
 constexpr LONG kEvents = SHCNE_UPDATEDIR | SHCNE_UPDATEITEM | SHCNE_CREATE | SHCNE_DELETE | SHCNE_MKDIR | SHCNE_RMDIR;
-
-size_t ListBytes(PCUIDLIST_RELATIVE list) {
-    size_t bytes = 0;
-    for (auto* at = reinterpret_cast<const BYTE*>(list); list && reinterpret_cast<const SHITEMID*>(at)->cb;
-         at += reinterpret_cast<const SHITEMID*>(at)->cb)
-        bytes += reinterpret_cast<const SHITEMID*>(at)->cb;
-    return bytes;
-}
 }  // namespace
 
 bool PrefixRest(PCIDLIST_ABSOLUTE item, PCIDLIST_ABSOLUTE prefix, PCUIDLIST_RELATIVE* rest) {
     if (!item || !prefix) return false;
-    const size_t wanted = ListBytes(prefix);
+    const size_t wanted = ILGetSize(prefix) - sizeof(USHORT);  // without the terminator
     // Walk whole items, so that a prefix ending inside one of them does not count.
     auto* at = reinterpret_cast<const BYTE*>(item);
     size_t walked = 0;

@@ -8,6 +8,7 @@
 #include "com/Bstr.h"
 #include "com/DispEventSink.h"
 #include "com/Handles.h"
+#include "com/ServerGone.h"
 #include "items/CReceiversPidlMgr.h"
 #include "module/ModuleState.h"
 #include "resource.h"
@@ -19,13 +20,6 @@ constexpr UINT StartCommand = 101;
 constexpr UINT_PTR LivenessTimer = 1;
 constexpr UINT LivenessPeriodMs = 2000;
 constexpr UINT PathCapacity = 260;
-
-// Results by which a call learns that the device manager's process is gone; a living but slow
-// server never gives these, so only a dead one ends the wait.
-bool IsServerGone(HRESULT hr) {
-    return hr == RPC_E_DISCONNECTED || hr == HRESULT_FROM_WIN32(RPC_S_SERVER_UNAVAILABLE) ||
-           hr == CO_E_OBJNOTCONNECTED || hr == RPC_E_SERVER_DIED || hr == RPC_E_SERVER_DIED_DNE;
-}
 
 std::wstring SystemMessage(HRESULT result) {
     wchar_t* text = nullptr;
