@@ -1,8 +1,9 @@
 #pragma once
 // The COM object model of the module: a class derives from ComObjectRoot and its interfaces,
 // lists them once with the INTERFACE_TABLE macros, and is instantiated as ComObject<T>
-// (plain) or ComAggObject<T> (aggregated under an outer unknown). IUnknown is written here
-// and nowhere else.
+// (plain) or ComAggObject<T> (aggregated under an outer unknown). Support objects that hold
+// no module lock derive from RefCounted<Class, Interfaces...> instead. IUnknown is written
+// here and nowhere else.
 #include <windows.h>
 #include <unknwn.h>
 #include <new>
@@ -200,3 +201,31 @@ HRESULT CreateComObject(ComObject<T>** out, Args&&... args) {
     (*out)->AddRef();
     return S_OK;
 }
+
+// The plain reference-counted form, without the module lock: for support objects whose
+// creator holds the lock and outlives them (an enumerator handed out by a data object, a
+// tool's drop target). Class derives from it, lists its interfaces in its table, and is made
+// with new holding the references its creator asks for.
+template <class Class, class... Interfaces>
+class RefCounted : public Interfaces... {
+public:
+    RefCounted(const RefCounted&) = delete;
+    RefCounted& operator=(const RefCounted&) = delete;
+
+    STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override {
+        return TableQueryInterface(static_cast<Class*>(this), Class::InterfaceTable(), riid, ppv);
+    }
+    STDMETHODIMP_(ULONG) AddRef() override { return InterlockedIncrement(&m_refCount); }
+    STDMETHODIMP_(ULONG) Release() override {
+        const ULONG count = InterlockedDecrement(&m_refCount);
+        if (count == 0) delete this;
+        return count;
+    }
+
+protected:
+    explicit RefCounted(LONG references = 0) : m_refCount(references) {}
+    virtual ~RefCounted() = default;
+
+private:
+    volatile LONG m_refCount;
+};

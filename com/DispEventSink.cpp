@@ -58,21 +58,7 @@ DispEventSink::DispEventSink(const IID& eventIid, const GUID& libid, WORD major,
     : m_eventIid(eventIid), m_libid(libid), m_major(major), m_minor(minor) {}
 
 STDMETHODIMP DispEventSink::QueryInterface(REFIID riid, void** ppv) {
-    if (!ppv) return E_POINTER;
-    *ppv = nullptr;
-    if (!IsEqualIID(riid, IID_IUnknown) && !IsEqualIID(riid, IID_IDispatch) && !IsEqualIID(riid, m_eventIid))
-        return E_NOINTERFACE;
-    *ppv = static_cast<IDispatch*>(this);
-    AddRef();
-    return S_OK;
-}
-
-STDMETHODIMP_(ULONG) DispEventSink::AddRef() { return InterlockedIncrement(&m_refCount); }
-
-STDMETHODIMP_(ULONG) DispEventSink::Release() {
-    ULONG count = InterlockedDecrement(&m_refCount);
-    if (count == 0) delete this;
-    return count;
+    return RefCounted::QueryInterface(IsEqualIID(riid, m_eventIid) ? IID_IDispatch : riid, ppv);
 }
 
 STDMETHODIMP DispEventSink::GetTypeInfoCount(UINT* count) {

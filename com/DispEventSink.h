@@ -12,7 +12,9 @@
 
 #include <vector>
 
-class DispEventSink : public IDispatch {
+#include "com/ComObject.h"
+
+class DispEventSink : public RefCounted<DispEventSink, IDispatch> {
 public:
     static constexpr DWORD NotAdvised = 0xFEFEFEFE;
 
@@ -21,10 +23,12 @@ public:
     DispEventSink(const DispEventSink&) = delete;
     DispEventSink& operator=(const DispEventSink&) = delete;
 
-    // IUnknown: IUnknown, IDispatch and the event interface.
+    BEGIN_INTERFACE_TABLE(DispEventSink)
+        INTERFACE_ENTRY(IDispatch)
+    END_INTERFACE_TABLE()
+
+    // The table's interfaces, and the event interface as IDispatch: its IID is known only here.
     STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override;
-    STDMETHODIMP_(ULONG) AddRef() override;
-    STDMETHODIMP_(ULONG) Release() override;
     // IDispatch: only Invoke does anything.
     STDMETHODIMP GetTypeInfoCount(UINT* count) override;
     STDMETHODIMP GetTypeInfo(UINT index, LCID lcid, ITypeInfo** info) override;
@@ -42,7 +46,7 @@ public:
     void Disconnect();
 
 protected:
-    virtual ~DispEventSink() = default;
+    ~DispEventSink() override = default;
     // The arguments in declaration order, already of their declared types. Unknown DISPIDs
     // are ignored.
     virtual void DispatchEvent(DISPID dispid, const VARIANT* args, UINT count) = 0;
@@ -52,7 +56,6 @@ private:
     HRESULT CoerceArguments(ITypeInfo* info, DISPID dispid, const DISPPARAMS* params, std::vector<VARIANT>& args,
                             UINT* argErr) const;
 
-    volatile LONG m_refCount = 0;
     DWORD m_cookie = NotAdvised;
     IID m_eventIid;
     GUID m_libid;

@@ -3,24 +3,7 @@
 #include <shlobj.h>
 
 PasteDropTarget::PasteDropTarget(std::wstring targetDir, PasteReport report)
-    : m_targetDir(std::move(targetDir)), m_report(std::move(report)) {}
-
-STDMETHODIMP PasteDropTarget::QueryInterface(REFIID riid, void** ppv) {
-    if (!ppv) return E_POINTER;
-    *ppv = nullptr;
-    if (!IsEqualIID(riid, IID_IUnknown) && !IsEqualIID(riid, IID_IDropTarget)) return E_NOINTERFACE;
-    *ppv = static_cast<IDropTarget*>(this);
-    AddRef();
-    return S_OK;
-}
-
-STDMETHODIMP_(ULONG) PasteDropTarget::AddRef() { return InterlockedIncrement(&m_refCount); }
-
-STDMETHODIMP_(ULONG) PasteDropTarget::Release() {
-    const ULONG count = InterlockedDecrement(&m_refCount);
-    if (count == 0) delete this;
-    return count;
-}
+    : RefCounted(1), m_targetDir(std::move(targetDir)), m_report(std::move(report)) {}
 
 STDMETHODIMP PasteDropTarget::DragEnter(IDataObject* data, DWORD, POINTL, DWORD* effect) {
     FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILEDESCRIPTORW)), nullptr,

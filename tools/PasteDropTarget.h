@@ -8,16 +8,17 @@
 #include <string>
 
 #include "VirtualFiles.h"
+#include "com/ComObject.h"
 
-class PasteDropTarget : public IDropTarget {
+// Made with new, holding its creator's reference.
+class PasteDropTarget : public RefCounted<PasteDropTarget, IDropTarget> {
 public:
     PasteDropTarget(std::wstring targetDir, PasteReport report);
-    PasteDropTarget(const PasteDropTarget&) = delete;
-    PasteDropTarget& operator=(const PasteDropTarget&) = delete;
 
-    STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override;
-    STDMETHODIMP_(ULONG) AddRef() override;
-    STDMETHODIMP_(ULONG) Release() override;
+    BEGIN_INTERFACE_TABLE(PasteDropTarget)
+        INTERFACE_ENTRY(IDropTarget)
+    END_INTERFACE_TABLE()
+
     STDMETHODIMP DragEnter(IDataObject* data, DWORD keyState, POINTL point, DWORD* effect) override;
     STDMETHODIMP DragOver(DWORD keyState, POINTL point, DWORD* effect) override;
     STDMETHODIMP DragLeave() override;
@@ -28,9 +29,8 @@ public:
     int Failed() const { return m_failed; }
 
 private:
-    virtual ~PasteDropTarget() = default;
+    ~PasteDropTarget() override = default;
 
-    volatile LONG m_refCount = 1;
     std::wstring m_targetDir;
     PasteReport m_report;
     bool m_acceptable = false;

@@ -6,23 +6,6 @@ CEnumFormatEtc::CEnumFormatEtc(UINT count, const FORMATETC* formats) {
     if (formats) m_formats.assign(formats, formats + count);
 }
 
-STDMETHODIMP CEnumFormatEtc::QueryInterface(REFIID riid, void** ppv) {
-    if (!ppv) return E_POINTER;
-    *ppv = nullptr;
-    if (!IsEqualIID(riid, IID_IUnknown) && !IsEqualIID(riid, IID_IEnumFORMATETC)) return E_NOINTERFACE;
-    *ppv = static_cast<IEnumFORMATETC*>(this);
-    AddRef();
-    return S_OK;
-}
-
-STDMETHODIMP_(ULONG) CEnumFormatEtc::AddRef() { return InterlockedIncrement(&m_refCount); }
-
-STDMETHODIMP_(ULONG) CEnumFormatEtc::Release() {
-    const ULONG count = InterlockedDecrement(&m_refCount);
-    if (count == 0) delete this;
-    return count;
-}
-
 // A short batch still answers S_OK: callers loop on the fetched count, not on the result.
 STDMETHODIMP CEnumFormatEtc::Next(ULONG count, FORMATETC* formats, ULONG* fetched) {
     if (m_formats.empty()) return S_FALSE;
