@@ -8,7 +8,7 @@ here=$(cd "$(dirname "$0")/../.." && pwd)
 status=$?
 report="$build/demo-report.txt"
 fail=0
-bad() { fail=1; echo "FAIL: $*"; }
+source "$(dirname "$0")/lib.sh"
 [ $status -eq 0 ] || bad "the demo ended with $status"
 # Every file of the receiver, with the size the receiver has and the time its description gives.
 receiver="$here/sample-receivers/Calvex Q9 USB"

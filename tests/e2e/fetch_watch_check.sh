@@ -12,13 +12,8 @@ export TZ=UTC  # the device's local times are compared with the files' times bel
 work=$(mktemp -d /tmp/calvex-watch-XXXXXX)
 root=$work/root away=$work/away target=$work/target out=$work/out.txt
 mkdir -p "$root" "$away" "$target"
-win() { echo "Z:$1" | sed 's|/|\\|g'; }
+source "$(dirname "$0")/lib.sh"
 fail=0
-bad() { fail=1; echo "FAIL: $*"; }
-waitfor() {  # waitfor FILE TEXT SECONDS
-  for _ in $(seq 1 $(($3 * 10))); do grep -qF -- "$2" "$1" 2>/dev/null && return 0; sleep 0.1; done
-  bad "no \"$2\" in $(basename "$1") within $3 s"; return 1
-}
 ends() {  # ends PID SECONDS: its exit code; killed when it runs longer
   for _ in $(seq 1 $(($2 * 10))); do kill -0 $1 2>/dev/null || break; sleep 0.1; done
   kill -0 $1 2>/dev/null && { bad "still running $2 s on"; kill -9 $1; }

@@ -7,13 +7,9 @@ build=$1
 run="$build/wine-run"
 work=$(mktemp -d /tmp/calvex-drag-XXXXXX)
 mkdir "$work/target"
-win() { echo "Z:$1" | sed 's|/|\\|g'; }
+source "$(dirname "$0")/lib.sh"
 export CALVEX_BUILD_DIR=$build CALVEX_SOURCE_DIR=${CALVEX_SOURCE_DIR:-$build/..}
 export CALVEX_DRAG_MARKER=$(win "$work/marker") CALVEX_DRAG_TARGET=$(win "$work/target")
-waitfor() {  # waitfor FILE TEXT SECONDS
-  for _ in $(seq 1 $(($3 * 10))); do grep -q "$2" "$1" 2>/dev/null && return 0; sleep 0.1; done
-  echo "FAIL: no \"$2\" in $1"; return 1
-}
 "$run" "$build/calvex-paste.exe" --drop "$CALVEX_DRAG_TARGET" 90 >"$work/paste.out" 2>&1 &
 paste=$!
 waitfor "$work/paste.out" "drop window ready" 60 || { kill $paste; exit 1; }
