@@ -49,9 +49,7 @@ case $install in
   regsvr32) "$here/tests/wine/prepare-prefix.sh" "$build" "$build/CalvexReceiversShellExt.dll" \
               "$build/CalvexDeviceSim.exe" >/dev/null || { echo "FAIL: regsvr32 registration"; exit 1; } ;;
   msi)
-    rm -rf "$WINEPREFIX"
-    wineboot -i >/dev/null 2>&1; wineserver -w
-    "$here/tests/wine/prefix-settings.sh" "$run"
+    "$here/tests/wine/prepare-prefix.sh" --fresh "$build" >/dev/null || { echo "FAIL: no fresh prefix"; exit 1; }
     "$run" msiexec /i "$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null)" /qn ADDLOCAL=ALL
     code=$?
     [ $code -eq 0 ] || { echo "FAIL: msiexec /i ended with $code"; exit 1; }

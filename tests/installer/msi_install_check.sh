@@ -3,12 +3,11 @@
 # so that nothing registered by other tests can stand in for what the MSI must write.
 set -euo pipefail
 build=$1
-export WINEPREFIX="$build/msi-test-prefix" WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml=" WINEARCH=win64
-rm -rf "$WINEPREFIX"
-wineboot -i >/dev/null 2>&1 || true
-wineserver -w
+here=$(cd "$(dirname "$0")/.." && pwd)
+export CALVEX_WINEPREFIX="$build/msi-test-prefix" WINEPREFIX="$build/msi-test-prefix"
+"$here/wine/prepare-prefix.sh" --fresh "$build" >/dev/null
 status=0
-wine "$build/installer_msi_install_test.exe" --gtest_color=no || status=$?
+"$build/wine-run" "$build/installer_msi_install_test.exe" --gtest_color=no || status=$?
 wineserver -k || true
 rm -rf "$WINEPREFIX"
 exit $status
