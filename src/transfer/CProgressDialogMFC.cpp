@@ -11,6 +11,7 @@
 #include "com/ServerGone.h"
 #include "items/CReceiversPidlMgr.h"
 #include "module/ModuleState.h"
+#include "module/SystemErrorText.h"
 #include "resource.h"
 #include "trace/TraceLog.h"
 #include "transfer/TransferNames.h"
@@ -20,20 +21,6 @@ constexpr UINT StartCommand = 101;
 constexpr UINT_PTR LivenessTimer = 1;
 constexpr UINT LivenessPeriodMs = 2000;
 constexpr UINT PathCapacity = 260;
-
-std::wstring SystemMessage(HRESULT result) {
-    wchar_t* text = nullptr;
-    const DWORD length = FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_FROM_SYSTEM |
-                                            FORMAT_MESSAGE_IGNORE_INSERTS,
-                                        nullptr, static_cast<DWORD>(result), 0, reinterpret_cast<LPWSTR>(&text), 0,
-                                        nullptr);
-    std::wstring message = length ? std::wstring(text, length) : std::wstring();
-    if (text) LocalFree(text);
-    while (!message.empty() && (message.back() == L'\n' || message.back() == L'\r')) message.pop_back();
-    wchar_t code[32];
-    wsprintfW(code, L"Error 0x%08X", static_cast<unsigned>(result));
-    return message.empty() ? std::wstring(code) : message + L"\r\n" + code;
-}
 }  // namespace
 
 // The dialog's side of the download events, typed by the device manager's type library.
@@ -233,7 +220,7 @@ void CProgressDialogMFC::PostNcDestroy() {
 }
 
 void CProgressDialogMFC::ShowError(HRESULT result) const {
-    MessageBoxW(m_window, SystemMessage(result).c_str(), LoadModuleString(IDS_FILE_DOWNLOAD).c_str(),
+    MessageBoxW(m_window, SystemErrorTextWithCode(result).c_str(), LoadModuleString(IDS_FILE_DOWNLOAD).c_str(),
                 MB_OK | MB_ICONERROR);
 }
 

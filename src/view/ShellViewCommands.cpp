@@ -10,6 +10,7 @@
 #include "CalvexDeviceMgrLib.h"
 #include "com/Bstr.h"
 #include "module/ModuleState.h"
+#include "module/SystemErrorText.h"
 #include "resource.h"
 #include "trace/TraceLog.h"
 #include "transfer/CCalvexReceiversDataObject.h"
@@ -45,13 +46,8 @@ std::vector<std::wstring> SplitKey(const std::wstring& key) {
 }
 
 void ShowDeleteError(HWND owner, HRESULT result) {
-    wchar_t* system = nullptr;
-    FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_FROM_SYSTEM | FORMAT_MESSAGE_IGNORE_INSERTS,
-                   nullptr, static_cast<DWORD>(result), 0, reinterpret_cast<LPWSTR>(&system), 0, nullptr);
-    wchar_t fallback[64];
-    wsprintfW(fallback, L"Error 0x%08X", static_cast<unsigned>(result));
-    MessageBoxW(owner, system ? system : fallback, LoadModuleString(IDS_MENU_DELETE).c_str(), MB_OK | MB_ICONERROR);
-    if (system) LocalFree(system);
+    MessageBoxW(owner, SystemErrorText(result).c_str(), LoadModuleString(IDS_MENU_DELETE).c_str(),
+                MB_OK | MB_ICONERROR);
 }
 }  // namespace
 
