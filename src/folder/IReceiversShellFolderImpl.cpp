@@ -12,6 +12,7 @@
 #include "items/CCalvexReceiversEnumIDList.h"
 #include "items/CCalvexReceiversExtractIcon.h"
 #include "items/CCalvexReceiversNotifyWindow.h"
+#include "items/DeviceManagerClient.h"
 #include "items/ItemPath.h"
 #include "module/ClassIds.h"
 #include "module/ModuleState.h"
@@ -417,13 +418,11 @@ HRESULT IReceiversShellFolderImpl::InitCollections() {
 HRESULT IReceiversShellFolderImpl::InitRootCollections() {
     ComPtr<IDeviceMgr> deviceMgr;
     // An unreachable device manager makes an empty folder, not an error.
-    if (FAILED(CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, deviceMgr.PutVoid())))
-        return S_OK;
+    if (FAILED(CreateDeviceManager(deviceMgr))) return S_OK;
     deviceMgr->Refresh();
     ComPtr<IDispatch> receivers;
-    if (FAILED(deviceMgr->get_Receivers(&receivers)) || !receivers) return S_OK;
     ComPtr<IReceiversColl> collection;
-    if (FAILED(receivers.QueryTo(IID_IReceiversColl, collection.PutVoid()))) return S_OK;
+    if (FAILED(GetReceivers(deviceMgr.Get(), receivers, collection))) return S_OK;
     m_eventSource = receivers;
     m_deviceMgrInterface = deviceMgr;
     m_deviceMgr = ComPtr<IDispatch>(deviceMgr.Get());
@@ -436,16 +435,15 @@ HRESULT IReceiversShellFolderImpl::InitRootCollections() {
 
 HRESULT IReceiversShellFolderImpl::InitReceiverCollections() {
     ComPtr<IReceiversColl> receivers;
-    if (!m_parent || !m_parent->m_eventSource || FAILED(m_parent->m_eventSource.QueryTo(IID_IReceiversColl, receivers.PutVoid())))
-        return S_OK;
+    if (!m_parent || FAILED(QueryReceiversColl(m_parent->m_eventSource.Get(), receivers))) return S_OK;
     // A key without exactly three fields looks up the empty key, which finds nothing.
     Bstr key(ReceiverLookupKey(m_ownName.c_str()));
     if (!key.Get()) return E_OUTOFMEMORY;
     ComPtr<IDispatch> item;
-    if (FAILED(receivers->get_ItemByKey(key.Get(), &item)) || !item) return E_INVALIDARG;
+    if (FAILED(GetReceiverByKey(receivers.Get(), key.Get(), item))) return E_INVALIDARG;
     ComPtr<IReceiver> receiver;
     ComPtr<IDispatch> files;
-    if (FAILED(item.QueryTo(IID_IReceiver, receiver.PutVoid())) || FAILED(receiver->get_Files(&files)) || !files) return S_OK;
+    if (FAILED(GetReceiverFiles(item.Get(), receiver, files)) || !files) return S_OK;
     m_eventSource = files;
     m_deviceMgr = ComPtr<IDispatch>(receiver.Get());
     m_filesSink = ComPtr<CCalvexFilesShellFolderEventHandler>(new (std::nothrow) CCalvexFilesShellFolderEventHandler(this));

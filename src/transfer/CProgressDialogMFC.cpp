@@ -5,11 +5,11 @@
 #include <new>
 #include <vector>
 
-#include "com/Bstr.h"
 #include "com/DispEventSink.h"
 #include "com/Handles.h"
 #include "com/ServerGone.h"
 #include "items/CReceiversPidlMgr.h"
+#include "items/DeviceManagerClient.h"
 #include "module/ModuleState.h"
 #include "module/SystemErrorText.h"
 #include "resource.h"
@@ -134,25 +134,19 @@ void CProgressDialogMFC::OnInitial() {
 HRESULT CProgressDialogMFC::StartFileDownload() {
     TraceA("CProgressDialogMFC::StartFileDownload\r\n");
     ComPtr<IFilesColl> files;
-    if (!m_receiver || FAILED(m_receiver.QueryTo(IID_IFilesColl, files.PutVoid()))) return E_NOINTERFACE;
-    Bstr name(DeviceFileName(m_itemPath).c_str());
+    if (FAILED(QueryFilesColl(m_receiver.Get(), files))) return E_NOINTERFACE;
     ComPtr<IDispatch> file;
-    HRESULT hr = files->get_ItemByName(name.Get(), &file);
+    HRESULT hr = GetFileByName(files.Get(), DeviceFileName(m_itemPath), file);
     if (hr != S_OK || !file) return hr;
     DisconnectEvents();
     if (SUCCEEDED(ConnectEvents(file.Get()))) m_file = file;
     ComPtr<IReceiverFile> fileInterface;
-    if (FAILED(file.QueryTo(IID_IReceiverFile, fileInterface.PutVoid()))) return E_NOINTERFACE;
+    if (FAILED(QueryReceiverFile(file.Get(), fileInterface))) return E_NOINTERFACE;
     IStream* stream = nullptr;
     hr = CreateStreamOnHGlobal(nullptr, TRUE, &stream);
     if (FAILED(hr)) return hr;
     m_stream.Attach(stream);
-    VARIANT destination;
-    VariantInit(&destination);
-    destination.vt = VT_UNKNOWN;
-    m_stream.CopyTo(&destination.punkVal);
-    hr = fileInterface->Download(destination);
-    VariantClear(&destination);
+    hr = StartDownload(fileInterface.Get(), m_stream.Get());
     m_fileInterface = fileInterface;
     return hr;
 }
