@@ -1,17 +1,13 @@
 #include "folder/IReceiversShellFolderImpl.h"
 
-#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <new>
 
-#include "com/Bstr.h"
 #include "com/ComObject.h"
-#include "folder/CCalvexFilesShellFolderEventHandler.h"
-#include "folder/CCalvexReceiversShellFolderEventHandler.h"
+#include "folder/FolderEventHandlers.h"
 #include "items/CCalvexReceiversEnumIDList.h"
 #include "items/CCalvexReceiversExtractIcon.h"
-#include "items/CCalvexReceiversNotifyWindow.h"
 #include "items/ItemPath.h"
 #include "module/ClassIds.h"
 #include "module/ModuleState.h"
@@ -52,16 +48,13 @@ IReceiversShellFolderImpl::IReceiversShellFolderImpl(DWORD brandKind) : m_brandK
     TraceA("IReceiversShellFolderImpl::IReceiversShellFolderImpl 0x%p\r\n", this);
     m_pidlMgr.reset(new (std::nothrow) CReceiversPidlMgr());
     if (!m_pidlMgr || !m_pidlMgr->IsValid() || FAILED(SHGetMalloc(&m_malloc))) return;
-    m_updateTimer.Reset(CreateWaitableTimerW(nullptr, FALSE, nullptr));
-    m_stopEvent.Reset(CreateEventW(nullptr, FALSE, FALSE, nullptr));
-    if (m_updateTimer && m_stopEvent) m_thread.Reset(CreateThread(nullptr, 0, ThreadProc, this, 0, nullptr));
+    m_notification.Start();
 }
 
 // Released in the folder's long-standing order: the thread is told to stop first and only
 // waited for once everything it cannot touch is gone; the device manager objects go last.
 IReceiversShellFolderImpl::~IReceiversShellFolderImpl() {
-    if (m_updateTimer) CancelWaitableTimer(m_updateTimer.Get());
-    if (m_stopEvent) SetEvent(m_stopEvent.Get());
+    m_notification.RequestStop();
     TraceA("IReceiversShellFolderImpl::~IReceiversShellFolderImpl 0x%p\r\n", this);
     m_ownPidl.Reset();
     DeleteEventSinks();
@@ -70,11 +63,7 @@ IReceiversShellFolderImpl::~IReceiversShellFolderImpl() {
     m_parent.Reset();
     m_malloc.Reset();
     m_pidlMgr.reset();
-    if (m_thread) WaitForSingleObject(m_thread.Get(), INFINITE);
-    m_thread.Reset();
-    m_updateTimer.Reset();
-    m_stopEvent.Reset();
-    m_viewWindows.clear();
+    m_notification.WaitStopped();
     m_deviceMgrInterface.Reset();
     m_deviceMgr.Reset();
     m_eventSource.Reset();
@@ -401,171 +390,4 @@ STDMETHODIMP IReceiversShellFolderImpl::GetDetailsOf(PCUITEMID_CHILD, UINT, SHEL
 }
 STDMETHODIMP IReceiversShellFolderImpl::MapColumnToSCID(UINT, SHCOLUMNID*) {
     return NotImplemented("IReceiversShellFolderImpl2::MapColumnToSCID - NOTIMPL\r\n");
-}
-
-// Collections and events
-
-HRESULT IReceiversShellFolderImpl::InitCollections() {
-    TraceA("IReceiversShellFolderImpl::InitCollections\r\n");
-    if (m_eventSource || !m_ownPidl || !m_pidlMgr) return S_OK;
-    const DWORD type = m_pidlMgr->GetLastItemType(m_ownPidl.Get());
-    if (IsRootType(type)) return InitRootCollections();
-    if (IsReceiverType(type)) return InitReceiverCollections();
-    return S_OK;
-}
-
-HRESULT IReceiversShellFolderImpl::InitRootCollections() {
-    ComPtr<IDeviceMgr> deviceMgr;
-    // An unreachable device manager makes an empty folder, not an error.
-    if (FAILED(CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, deviceMgr.PutVoid())))
-        return S_OK;
-    deviceMgr->Refresh();
-    ComPtr<IDispatch> receivers;
-    if (FAILED(deviceMgr->get_Receivers(&receivers)) || !receivers) return S_OK;
-    ComPtr<IReceiversColl> collection;
-    if (FAILED(receivers.QueryTo(IID_IReceiversColl, collection.PutVoid()))) return S_OK;
-    m_eventSource = receivers;
-    m_deviceMgrInterface = deviceMgr;
-    m_deviceMgr = ComPtr<IDispatch>(deviceMgr.Get());
-    m_receiversSink = ComPtr<CCalvexReceiversShellFolderEventHandler>(
-        new (std::nothrow) CCalvexReceiversShellFolderEventHandler(this));
-    if (m_receiversSink) m_receiversSink->Advise(m_eventSource.Get());
-    TraceA("Advised for receivers, 0x%p\r\n", m_eventSource.Get());
-    return S_OK;
-}
-
-HRESULT IReceiversShellFolderImpl::InitReceiverCollections() {
-    ComPtr<IReceiversColl> receivers;
-    if (!m_parent || !m_parent->m_eventSource || FAILED(m_parent->m_eventSource.QueryTo(IID_IReceiversColl, receivers.PutVoid())))
-        return S_OK;
-    // A key without exactly three fields looks up the empty key, which finds nothing.
-    Bstr key(ReceiverLookupKey(m_ownName.c_str()));
-    if (!key.Get()) return E_OUTOFMEMORY;
-    ComPtr<IDispatch> item;
-    if (FAILED(receivers->get_ItemByKey(key.Get(), &item)) || !item) return E_INVALIDARG;
-    ComPtr<IReceiver> receiver;
-    ComPtr<IDispatch> files;
-    if (FAILED(item.QueryTo(IID_IReceiver, receiver.PutVoid())) || FAILED(receiver->get_Files(&files)) || !files) return S_OK;
-    m_eventSource = files;
-    m_deviceMgr = ComPtr<IDispatch>(receiver.Get());
-    m_filesSink = ComPtr<CCalvexFilesShellFolderEventHandler>(new (std::nothrow) CCalvexFilesShellFolderEventHandler(this));
-    if (m_filesSink) m_filesSink->Advise(m_eventSource.Get());
-    TraceA("Advised for files, 0x%p\r\n", m_eventSource.Get());
-    return S_OK;
-}
-
-HRESULT IReceiversShellFolderImpl::DoUpdateList() {
-    if (m_updateTimer) CancelWaitableTimer(m_updateTimer.Get());
-    TraceA("IReceiversShellFolderImpl::DoUpdateList\r\n");
-    const std::wstring path = GetFullPath();
-    if (path.empty()) return S_FALSE;
-    PostPathToNotifyWindow(path);
-    // One view message five seconds after the last of a burst.
-    FILETIME now;
-    GetSystemTimeAsFileTime(&now);
-    LARGE_INTEGER due;
-    due.LowPart = now.dwLowDateTime;
-    due.HighPart = static_cast<LONG>(now.dwHighDateTime);
-    due.QuadPart += 50000000;
-    if (m_updateTimer) SetWaitableTimer(m_updateTimer.Get(), &due, 0, nullptr, nullptr, FALSE);
-    return S_OK;
-}
-
-HRESULT IReceiversShellFolderImpl::PostPathToNotifyWindow(const std::wstring& path) {
-    const size_t bytes = (path.size() + 1) * sizeof(wchar_t);
-    UniqueGlobal block(GlobalAlloc(GHND, bytes));
-    if (!block) return E_OUTOFMEMORY;
-    {
-        GlobalLockGuard<wchar_t> text(block.Get());
-        if (!text) return E_OUTOFMEMORY;
-        memcpy(text.Get(), path.c_str(), bytes);
-    }
-    // The window frees the block once it has it.
-    if (!PostMessageW(CCalvexReceiversNotifyWindow::GetNotifyWindow(), UpdateFolderMessage(), 0,
-                      reinterpret_cast<LPARAM>(block.Get())))
-        return E_FAIL;
-    block.Release();
-    return S_OK;
-}
-
-HRESULT IReceiversShellFolderImpl::EventReceived() {
-    TraceA("IReceiversShellFolderImpl2::EventReceived\r\n");
-    if (m_updateTimer) CancelWaitableTimer(m_updateTimer.Get());
-    return S_OK;
-}
-
-void IReceiversShellFolderImpl::AddViewWindow(HWND hwnd) {
-    CriticalSectionLock lock(m_viewWindowsLock);
-    RemoveViewWindowLocked(hwnd);  // never listed twice
-    const size_t count = m_viewWindows.size();
-    if (count == m_viewWindows.capacity()) {
-        const size_t capacity = count == 0 ? 1 : count * 2;
-        if (capacity > 0x0FFFFFFF || (count & 0x40000000)) return;
-        try {
-            m_viewWindows.reserve(capacity);
-        } catch (const std::bad_alloc&) {
-            return;  // silently not added
-        }
-    }
-    m_viewWindows.push_back(hwnd);
-}
-
-void IReceiversShellFolderImpl::RemoveViewWindow(HWND hwnd) {
-    CriticalSectionLock lock(m_viewWindowsLock);
-    RemoveViewWindowLocked(hwnd);
-}
-
-void IReceiversShellFolderImpl::RemoveViewWindowLocked(HWND hwnd) {
-    auto found = std::find(m_viewWindows.begin(), m_viewWindows.end(), hwnd);
-    if (found != m_viewWindows.end()) m_viewWindows.erase(found);
-}
-
-size_t IReceiversShellFolderImpl::ViewWindowCount() {
-    CriticalSectionLock lock(m_viewWindowsLock);
-    return m_viewWindows.size();
-}
-
-DWORD WINAPI IReceiversShellFolderImpl::ThreadProc(void* self) {
-    return static_cast<IReceiversShellFolderImpl*>(self)->ThreadFunc();
-}
-
-DWORD IReceiversShellFolderImpl::ThreadFunc() {
-    const HANDLE handles[] = {m_stopEvent.Get(), m_updateTimer.Get()};
-    for (;;) {
-        const DWORD result = WaitForMultipleObjects(2, handles, FALSE, INFINITE);
-        if (result == WAIT_OBJECT_0) return 0;
-        if (result != WAIT_OBJECT_0 + 1) {
-            TraceA("IReceiversShellFolderImpl::ThreadFunc - dwRes is %u (error: %u)\r\n", result, GetLastError());
-            continue;
-        }
-        TraceA("IReceiversShellFolderImpl::ThreadFunc - direct injection for notify message are used\r\n");
-        const UINT message = RegisterWindowMessageW(L"CCalvexReceiversShellView - Notification Message");
-        CriticalSectionLock lock(m_viewWindowsLock);
-        for (HWND hwnd : m_viewWindows) PostMessageW(hwnd, message, 0, 0);
-    }
-}
-
-void IReceiversShellFolderImpl::FinalRelease() {
-    TraceA("IReceiversShellFolderImpl::FinalRelease 0x%p\r\n", this);
-    if (m_receiversSink) {
-        m_receiversSink->Unadvise(m_eventSource.Get());
-        TraceA("IReceiversShellFolderImpl::FinalRelease - unadvised from receivers collection\r\n");
-    } else if (m_filesSink) {
-        m_filesSink->Unadvise(m_eventSource.Get());
-        TraceA("IReceiversShellFolderImpl::FinalRelease - unadvised from files collection\r\n");
-    }
-}
-
-void IReceiversShellFolderImpl::DeleteEventSinks() {
-    // Remote callers that still hold a sink (a server gone without unadvising) lose it here.
-    if (m_filesSink) {
-        m_filesSink->SetOwner(nullptr);
-        m_filesSink->Disconnect();
-        m_filesSink.Reset();
-    }
-    if (m_receiversSink) {
-        m_receiversSink->SetOwner(nullptr);
-        m_receiversSink->Disconnect();
-        m_receiversSink.Reset();
-    }
 }

@@ -8,12 +8,10 @@
 
 #include <memory>
 #include <string>
-#include <vector>
 
 #include "CalvexDeviceMgrLib.h"
 #include "com/ComPtr.h"
-#include "com/CriticalSection.h"
-#include "com/Handles.h"
+#include "folder/FolderNotificationThread.h"
 #include "items/CReceiversPidlMgr.h"
 
 class CCalvexReceiversShellFolderEventHandler;
@@ -68,7 +66,7 @@ public:
     // parent: null for a root folder; pidl: the own list relative to the parent, or null for
     // this brand's root item.
     HRESULT Init(IReceiversShellFolderImpl* parent, LPCITEMIDLIST pidl);
-    // Binds the folder to its event source on first need (see the .cpp).
+    // Binds the folder to its event source on first need (ShellFolderEvents.cpp).
     HRESULT InitCollections();
     // A view that refreshed itself cancels the pending view message.
     HRESULT EventReceived();
@@ -101,10 +99,7 @@ private:
     HRESULT CreateItemObject(LPCITEMIDLIST item, REFIID riid, void** ppv);
     HRESULT DisplayName(LPCITEMIDLIST pidl, SHGDNF flags, std::wstring& name) const;
     static HRESULT PostPathToNotifyWindow(const std::wstring& path);
-    void RemoveViewWindowLocked(HWND hwnd);
     void DeleteEventSinks();
-    static DWORD WINAPI ThreadProc(void* self);
-    DWORD ThreadFunc();
 
     UniquePidl m_ownPidl;
     ComPtr<IReceiversShellFolderImpl> m_parent;
@@ -118,9 +113,5 @@ private:
     ComPtr<CCalvexReceiversShellFolderEventHandler> m_receiversSink;
     ComPtr<CCalvexFilesShellFolderEventHandler> m_filesSink;
     ComPtr<IDeviceMgr> m_deviceMgrInterface;
-    std::vector<HWND> m_viewWindows;
-    CriticalSection m_viewWindowsLock;
-    UniqueHandle m_updateTimer;
-    UniqueHandle m_stopEvent;
-    UniqueHandle m_thread;
+    FolderNotificationThread m_notification;  // view windows, update timer, thread
 };

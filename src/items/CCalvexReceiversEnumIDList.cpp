@@ -4,55 +4,13 @@
 #include <new>
 #include <vector>
 
-#include "CalvexDeviceMgrLib.h"
-#include "com/Bstr.h"
+#include "items/DeviceManagerClient.h"
 #include "items/ItemPath.h"
 #include "module/ClassCreators.h"
-#include "module/ModuleState.h"
-#include "resources/resource.h"
 #include "trace/TraceLog.h"
 
 namespace {
 const wchar_t kDefaultRootName[] = L"Calvex Receivers";
-const DWORD kPortTypeNamed = 1;
-const DWORD kPortTypeUsb = 2;
-
-// The receiver key of one listed receiver, or false when the receiver is not listed here:
-// another brand, or a label that is missing or empty.
-bool ReadReceiverKey(IDispatch* item, DWORD brand, std::wstring* key) {
-    ComPtr<IReceiver> receiver;
-    if (FAILED(item->QueryInterface(IID_IReceiver, receiver.PutVoid())) || !receiver) return false;
-    long receiverBrand = 0;
-    // Exactly S_OK: a receiver that answers S_FALSE has not told its brand.
-    if (receiver->get_Brand(&receiverBrand) != S_OK || static_cast<DWORD>(receiverBrand) != brand) return false;
-    Bstr label;
-    if (receiver->get_Label(label.Put()) != S_OK || label.Length() == 0) return false;
-
-    Bstr serial, model, portName;
-    long portType = 0;
-    receiver->get_SerialNumber(serial.Put());
-    receiver->get_Model(model.Put());
-    receiver->get_PortType(&portType);
-    std::wstring port;
-    if (static_cast<DWORD>(portType) == kPortTypeNamed) {
-        receiver->get_PortName(portName.Put());
-        port = portName.Str();
-    } else {
-        port = LoadModuleString(static_cast<DWORD>(portType) == kPortTypeUsb ? IDS_PORT_USB : IDS_PORT_UNKNOWN);
-    }
-    *key = MakeReceiverKey(serial.Str(), model.Str(), port);
-    return true;
-}
-
-// Brand 1 files always show as ".qpr"; of brand 2 only the HVL3 family's do, the others
-// show the names the service gives.
-bool FilesGetExtension(DWORD brand, const std::vector<std::wstring>& pathParts) {
-    if (brand == BrandCalvex) return true;
-    if (pathParts.size() < 2) return false;
-    const std::vector<std::wstring> fields = SplitReceiverKey(pathParts[1].c_str());
-    if (fields.size() < 2) return false;
-    return wcsncmp(ModelFromKeyField(fields[1]).c_str(), L"HVL3", 4) == 0;
-}
 }  // namespace
 
 CCalvexReceiversEnumIDList::CCalvexReceiversEnumIDList(IMalloc* malloc) : m_pidlMgr(malloc) {
@@ -87,7 +45,8 @@ BOOL CCalvexReceiversEnumIDList::CreateEnumList(const wchar_t* path, DWORD flags
         if ((flags & (SHCONTF_FOLDERS | SHCONTF_NONFOLDERS)) && parts.empty()) return FALSE;
         if ((flags & SHCONTF_FOLDERS) && !ListReceivers(folderPath, collection, brand)) return FALSE;
         if ((flags & SHCONTF_NONFOLDERS) &&
-            !ListFiles(folderPath, FilesGetExtension(brand, parts), collection, brand))
+            !ListFiles(folderPath, FilesShowExtension(brand, parts.size() < 2 ? std::wstring() : parts[1]), collection,
+                       brand))
             return FALSE;
         return TRUE;
     } catch (const std::bad_alloc&) {
@@ -97,16 +56,15 @@ BOOL CCalvexReceiversEnumIDList::CreateEnumList(const wchar_t* path, DWORD flags
 
 bool CCalvexReceiversEnumIDList::ListReceivers(const std::wstring& path, IUnknown* collection, DWORD brand) {
     ComPtr<IReceiversColl> receivers;
-    if (!collection || FAILED(collection->QueryInterface(IID_IReceiversColl, receivers.PutVoid())) || !receivers)
-        return true;
-    long count = 0;
-    receivers->get_Count(&count);
+    if (FAILED(QueryReceiversColl(collection, receivers))) return true;
+    const long count = ReceiverCount(receivers.Get());
     TraceA("CCalvexReceiversEnumIDList::CreateEnumList - receivers:%i %p\r\n", static_cast<int>(count), this);
     for (long index = 0; index < count; ++index) {
-        ComPtr<IDispatch> item;
-        if (FAILED(receivers->get_Item(index, &item)) || !item) continue;
+        ComPtr<IReceiver> receiver;
         std::wstring key;
-        if (!ReadReceiverKey(item.Get(), brand, &key)) continue;
+        if (FAILED(GetReceiverAt(receivers.Get(), index, receiver)) ||
+            !ReadListedReceiverKey(receiver.Get(), brand, &key))
+            continue;
         // The path as given, not the default root name: the folder always gives one.
         UniquePidl pidl(m_pidlMgr, m_pidlMgr.CreateLastFromPath((path + L"\\" + key).c_str(), brand));
         if (pidl && !AddToEnumList(pidl)) return false;
@@ -117,29 +75,19 @@ bool CCalvexReceiversEnumIDList::ListReceivers(const std::wstring& path, IUnknow
 bool CCalvexReceiversEnumIDList::ListFiles(const std::wstring& path, bool withExtension, IUnknown* collection,
                                            DWORD brand) {
     ComPtr<IFilesColl> files;
-    if (!collection || FAILED(collection->QueryInterface(IID_IFilesColl, files.PutVoid())) || !files) return true;
-    long count = 0;
-    files->get_Count(&count);
+    if (FAILED(QueryFilesColl(collection, files))) return true;
+    const long count = FileCount(files.Get());
     TraceA("CCalvexReceiversEnumIDList::CreateEnumList - files: %i %p\r\n", static_cast<int>(count), this);
     for (long index = 0; index < count; ++index) {
-        ComPtr<IDispatch> item;
-        if (FAILED(files->get_Item(index, &item)) || !item) continue;
         ComPtr<IReceiverFile> file;
-        if (FAILED(item->QueryInterface(IID_IReceiverFile, file.PutVoid())) || !file) continue;
-        Bstr name;
-        DATE time = 0;
-        long size = 0;
-        // Results not looked at: a value that cannot be read stays 0.
-        file->get_Name(name.Put());
-        file->get_Time(&time);
-        file->get_Size(&size);
-        std::wstring itemPath = path + L"\\" + name.Str();
-        if (withExtension) itemPath += L".qpr";
+        if (FAILED(GetFileAt(files.Get(), index, file))) continue;
+        const ReceiverFileInfo info = ReadFileInfo(file.Get());
+        const std::wstring itemPath = path + L"\\" + FileDisplayName(info.name, withExtension);
         UniquePidl pidl(m_pidlMgr, m_pidlMgr.CreateLastFromPath(itemPath.c_str(), brand));
         if (!pidl) continue;  // an item that cannot be made is skipped
         ReceiverItemData* data = m_pidlMgr.GetData(pidl.Get());
-        data->size = static_cast<DWORD>(size);
-        data->time = time;
+        data->size = static_cast<DWORD>(info.size);
+        data->time = info.time;
         if (!AddToEnumList(pidl)) return false;
     }
     return true;

@@ -5,12 +5,13 @@
 #include <new>
 #include <vector>
 
-#include "com/Bstr.h"
 #include "com/DispEventSink.h"
 #include "com/Handles.h"
 #include "com/ServerGone.h"
 #include "items/CReceiversPidlMgr.h"
+#include "items/DeviceManagerClient.h"
 #include "module/ModuleState.h"
+#include "module/SystemErrorText.h"
 #include "resource.h"
 #include "trace/TraceLog.h"
 #include "transfer/TransferNames.h"
@@ -20,20 +21,6 @@ constexpr UINT StartCommand = 101;
 constexpr UINT_PTR LivenessTimer = 1;
 constexpr UINT LivenessPeriodMs = 2000;
 constexpr UINT PathCapacity = 260;
-
-std::wstring SystemMessage(HRESULT result) {
-    wchar_t* text = nullptr;
-    const DWORD length = FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_FROM_SYSTEM |
-                                            FORMAT_MESSAGE_IGNORE_INSERTS,
-                                        nullptr, static_cast<DWORD>(result), 0, reinterpret_cast<LPWSTR>(&text), 0,
-                                        nullptr);
-    std::wstring message = length ? std::wstring(text, length) : std::wstring();
-    if (text) LocalFree(text);
-    while (!message.empty() && (message.back() == L'\n' || message.back() == L'\r')) message.pop_back();
-    wchar_t code[32];
-    wsprintfW(code, L"Error 0x%08X", static_cast<unsigned>(result));
-    return message.empty() ? std::wstring(code) : message + L"\r\n" + code;
-}
 }  // namespace
 
 // The dialog's side of the download events, typed by the device manager's type library.
@@ -147,25 +134,19 @@ void CProgressDialogMFC::OnInitial() {
 HRESULT CProgressDialogMFC::StartFileDownload() {
     TraceA("CProgressDialogMFC::StartFileDownload\r\n");
     ComPtr<IFilesColl> files;
-    if (!m_receiver || FAILED(m_receiver.QueryTo(IID_IFilesColl, files.PutVoid()))) return E_NOINTERFACE;
-    Bstr name(DeviceFileName(m_itemPath).c_str());
+    if (FAILED(QueryFilesColl(m_receiver.Get(), files))) return E_NOINTERFACE;
     ComPtr<IDispatch> file;
-    HRESULT hr = files->get_ItemByName(name.Get(), &file);
+    HRESULT hr = GetFileByName(files.Get(), DeviceFileName(m_itemPath), file);
     if (hr != S_OK || !file) return hr;
     DisconnectEvents();
     if (SUCCEEDED(ConnectEvents(file.Get()))) m_file = file;
     ComPtr<IReceiverFile> fileInterface;
-    if (FAILED(file.QueryTo(IID_IReceiverFile, fileInterface.PutVoid()))) return E_NOINTERFACE;
+    if (FAILED(QueryReceiverFile(file.Get(), fileInterface))) return E_NOINTERFACE;
     IStream* stream = nullptr;
     hr = CreateStreamOnHGlobal(nullptr, TRUE, &stream);
     if (FAILED(hr)) return hr;
     m_stream.Attach(stream);
-    VARIANT destination;
-    VariantInit(&destination);
-    destination.vt = VT_UNKNOWN;
-    m_stream.CopyTo(&destination.punkVal);
-    hr = fileInterface->Download(destination);
-    VariantClear(&destination);
+    hr = StartDownload(fileInterface.Get(), m_stream.Get());
     m_fileInterface = fileInterface;
     return hr;
 }
@@ -233,7 +214,7 @@ void CProgressDialogMFC::PostNcDestroy() {
 }
 
 void CProgressDialogMFC::ShowError(HRESULT result) const {
-    MessageBoxW(m_window, SystemMessage(result).c_str(), LoadModuleString(IDS_FILE_DOWNLOAD).c_str(),
+    MessageBoxW(m_window, SystemErrorTextWithCode(result).c_str(), LoadModuleString(IDS_FILE_DOWNLOAD).c_str(),
                 MB_OK | MB_ICONERROR);
 }
 

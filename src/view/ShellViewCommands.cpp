@@ -7,9 +7,11 @@
 #include <string>
 #include <vector>
 
-#include "CalvexDeviceMgrLib.h"
 #include "com/Bstr.h"
+#include "items/DeviceManagerClient.h"
+#include "items/ItemPath.h"
 #include "module/ModuleState.h"
+#include "module/SystemErrorText.h"
 #include "resource.h"
 #include "trace/TraceLog.h"
 #include "transfer/CCalvexReceiversDataObject.h"
@@ -35,23 +37,9 @@ bool IsAcceptedGroup(const GUID* group) {
            IsEqualGUID(*group, CGID_ShellDocView);
 }
 
-std::vector<std::wstring> SplitKey(const std::wstring& key) {
-    std::vector<std::wstring> fields(1);
-    for (wchar_t c : key) {
-        if (c == L'!') fields.emplace_back();
-        else fields.back() += c;
-    }
-    return fields;
-}
-
 void ShowDeleteError(HWND owner, HRESULT result) {
-    wchar_t* system = nullptr;
-    FormatMessageW(FORMAT_MESSAGE_ALLOCATE_BUFFER | FORMAT_MESSAGE_FROM_SYSTEM | FORMAT_MESSAGE_IGNORE_INSERTS,
-                   nullptr, static_cast<DWORD>(result), 0, reinterpret_cast<LPWSTR>(&system), 0, nullptr);
-    wchar_t fallback[64];
-    wsprintfW(fallback, L"Error 0x%08X", static_cast<unsigned>(result));
-    MessageBoxW(owner, system ? system : fallback, LoadModuleString(IDS_MENU_DELETE).c_str(), MB_OK | MB_ICONERROR);
-    if (system) LocalFree(system);
+    MessageBoxW(owner, SystemErrorText(result).c_str(), LoadModuleString(IDS_MENU_DELETE).c_str(),
+                MB_OK | MB_ICONERROR);
 }
 }  // namespace
 
@@ -138,21 +126,9 @@ void CCalvexReceiversShellView::OnDelete() {
         if (!data || !IsFileType(data->type)) continue;
         wchar_t name[kPathCapacity] = L"";
         m_pidlManager->GetPath(item.Get(), name, kPathCapacity, true);
-        std::wstring fileName = name;
-        const size_t dot = fileName.rfind(L'.');
-        // The receiver knows its files without ".qpr".
-        if (dot != std::wstring::npos && _wcsicmp(fileName.c_str() + dot, L".qpr") == 0) fileName.resize(dot);
-        ComPtr<IFilesColl> files;
-        ComPtr<IDispatch> found;
-        ComPtr<IReceiverFile> file;
-        if (!m_folder->EventSourceCollection() ||
-            FAILED(m_folder->EventSourceCollection()->QueryInterface(IID_IFilesColl, files.PutVoid())))
-            continue;
-        Bstr key(fileName);
-        if (FAILED(files->get_ItemByName(key.Get(), &found)) || !found ||
-            FAILED(found.QueryTo(IID_IReceiverFile, file.PutVoid())))
-            continue;
-        HRESULT hr = file->Delete();
+        FoundReceiverFile found;
+        if (FAILED(FindShownFile(m_folder->EventSourceCollection(), name, found))) continue;
+        const HRESULT hr = found.file->Delete();
         if (hr != 0) ShowDeleteError(m_listWindow, hr);
         Refresh();
     }
@@ -171,7 +147,7 @@ void CCalvexReceiversShellView::OnProperties() {
 STDMETHODIMP CCalvexReceiversShellView::Refresh() {
     TraceA("CCalvexReceiversShellView::Refresh\r\n");
     ComPtr<IDeviceMgr> manager;
-    HRESULT hr = CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, manager.PutVoid());
+    HRESULT hr = CreateDeviceManager(manager);
     if (FAILED(hr) || !manager) {
         TraceA("CCalvexReceiversShellView::Refresh - access to receiver manager is failed [0x%08X]\r\n",
                static_cast<unsigned>(hr));
@@ -192,22 +168,19 @@ STDMETHODIMP CCalvexReceiversShellView::Refresh() {
 }
 
 HRESULT CCalvexReceiversShellView::RefreshFiles(IDeviceMgr* manager) {
-    ComPtr<IDispatch> receivers;
-    ComPtr<IReceiversColl> collection;
-    HRESULT hr = manager->get_Receivers(&receivers);
-    if (SUCCEEDED(hr)) hr = receivers ? receivers.QueryTo(IID_IReceiversColl, collection.PutVoid()) : E_POINTER;
-    const std::vector<std::wstring> fields =
-        SplitKey(m_pidlManager->GetItemName(m_pidlManager->GetLastItem(m_folderPidl.Get())));
-    const std::wstring lookup = fields.size() == 3 ? fields[2] + L"-" + fields[0] : std::wstring();
+    ComPtr<IDispatch> object;
+    ComPtr<IReceiversColl> receivers;
+    HRESULT hr = GetReceivers(manager, object, receivers);
+    const std::wstring lookup =
+        ReceiverLookupKey(m_pidlManager->GetItemName(m_pidlManager->GetLastItem(m_folderPidl.Get())).c_str());
     TraceW(L"CCalvexReceiversShellView::Refresh - get files on receiver [%s]\r\n", lookup.c_str());
     if (FAILED(hr)) return hr;
     Bstr key(lookup);
     ComPtr<IDispatch> item;
     ComPtr<IReceiver> receiver;
     ComPtr<IDispatch> files;
-    hr = collection->get_ItemByKey(key.Get(), &item);
-    if (SUCCEEDED(hr)) hr = item ? item.QueryTo(IID_IReceiver, receiver.PutVoid()) : E_POINTER;
-    if (SUCCEEDED(hr)) hr = receiver->get_Files(&files);
+    hr = GetReceiverByKey(receivers.Get(), key.Get(), item);
+    if (SUCCEEDED(hr)) hr = GetReceiverFiles(item.Get(), receiver, files);
     return hr;
 }
 
