@@ -10,7 +10,6 @@
 #include "items/CCalvexReceiversExtractIcon.h"
 #include "items/ItemPath.h"
 #include "module/ClassIds.h"
-#include "module/ModuleState.h"
 #include "trace/TraceLog.h"
 #include "transfer/CCalvexReceiversContextMenu.h"
 #include "transfer/CCalvexReceiversDataObject.h"

@@ -57,7 +57,7 @@ BOOL CCalvexReceiversEnumIDList::CreateEnumList(const wchar_t* path, DWORD flags
 bool CCalvexReceiversEnumIDList::ListReceivers(const std::wstring& path, IUnknown* collection, DWORD brand) {
     ComPtr<IReceiversColl> receivers;
     if (FAILED(QueryReceiversColl(collection, receivers))) return true;
-    const long count = ReceiverCount(receivers.Get());
+    const long count = CollectionCount(receivers.Get());
     TraceA("CCalvexReceiversEnumIDList::CreateEnumList - receivers:%i %p\r\n", static_cast<int>(count), this);
     for (long index = 0; index < count; ++index) {
         ComPtr<IReceiver> receiver;
@@ -76,7 +76,7 @@ bool CCalvexReceiversEnumIDList::ListFiles(const std::wstring& path, bool withEx
                                            DWORD brand) {
     ComPtr<IFilesColl> files;
     if (FAILED(QueryFilesColl(collection, files))) return true;
-    const long count = FileCount(files.Get());
+    const long count = CollectionCount(files.Get());
     TraceA("CCalvexReceiversEnumIDList::CreateEnumList - files: %i %p\r\n", static_cast<int>(count), this);
     for (long index = 0; index < count; ++index) {
         ComPtr<IReceiverFile> file;

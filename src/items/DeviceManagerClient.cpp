@@ -67,18 +67,6 @@ HRESULT GetReceiverFiles(IDispatch* object, ComPtr<IReceiver>& receiver, ComPtr<
     return SUCCEEDED(hr) ? receiver->get_Files(files.ReleaseAndGetAddressOf()) : hr;
 }
 
-long ReceiverCount(IReceiversColl* receivers) {
-    long count = 0;
-    receivers->get_Count(&count);
-    return count;
-}
-
-long FileCount(IFilesColl* files) {
-    long count = 0;
-    files->get_Count(&count);
-    return count;
-}
-
 HRESULT GetReceiverAt(IReceiversColl* receivers, long index, ComPtr<IReceiver>& receiver) {
     ComPtr<IDispatch> item;
     HRESULT hr = receivers->get_Item(index, &item);

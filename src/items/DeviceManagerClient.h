@@ -29,8 +29,12 @@ HRESULT GetReceiverFiles(IDispatch* object, ComPtr<IReceiver>& receiver, ComPtr<
 
 // Enumeration: get_Count as the service answers it (0 when it does not), get_Item as the
 // item's own interface.
-long ReceiverCount(IReceiversColl* receivers);
-long FileCount(IFilesColl* files);
+template <class Collection>
+long CollectionCount(Collection* collection) {
+    long count = 0;
+    collection->get_Count(&count);
+    return count;
+}
 HRESULT GetReceiverAt(IReceiversColl* receivers, long index, ComPtr<IReceiver>& receiver);
 HRESULT GetFileAt(IFilesColl* files, long index, ComPtr<IReceiverFile>& file);
 // The receiver key ("serial!model!port text") of a receiver that a folder of this brand lists;
