@@ -202,10 +202,10 @@ HRESULT CreateComObject(ComObject<T>** out, Args&&... args) {
     return S_OK;
 }
 
-// The plain reference-counted form, without the module lock: for support objects whose
-// creator holds the lock and outlives them (an enumerator handed out by a data object, a
-// tool's drop target). Class derives from it, lists its interfaces in its table, and is made
-// with new holding the references its creator asks for.
+// The plain reference-counted form, without the module lock: for support objects that take
+// no lock of their own (an enumerator a data object hands out, an event sink its owner holds,
+// a tool's drop target). Class derives from it, lists its interfaces in its table, and is
+// made with new holding the references its creator asks for.
 template <class Class, class... Interfaces>
 class RefCounted : public Interfaces... {
 public:

@@ -8,13 +8,16 @@
 #include <functional>
 #include <string>
 
-class SimClassFactory final : public IClassFactory {
+#include "com/UncountedObject.h"
+
+class SimClassFactory final : public Uncounted<SimClassFactory, IClassFactory> {
 public:
     explicit SimClassFactory(std::function<std::wstring()> root) : m_root(std::move(root)) {}
 
-    STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override;
-    STDMETHODIMP_(ULONG) AddRef() override { return 2; }
-    STDMETHODIMP_(ULONG) Release() override { return 1; }
+    BEGIN_INTERFACE_TABLE(SimClassFactory)
+        INTERFACE_ENTRY(IClassFactory)
+    END_INTERFACE_TABLE()
+
     STDMETHODIMP CreateInstance(IUnknown* outer, REFIID riid, void** ppv) override;
     STDMETHODIMP LockServer(BOOL lock) override;
 

@@ -16,19 +16,7 @@ bool SinkIsGone(HRESULT hr) {
 }  // namespace
 
 SimConnectionPoint::SimConnectionPoint(IConnectionPointContainer* container, REFIID events)
-    : m_container(container), m_events(events) {}
-
-STDMETHODIMP SimConnectionPoint::QueryInterface(REFIID riid, void** ppv) {
-    if (!ppv) return E_POINTER;
-    *ppv = nullptr;
-    if (!IsEqualIID(riid, IID_IUnknown) && !IsEqualIID(riid, IID_IConnectionPoint)) return E_NOINTERFACE;
-    *ppv = static_cast<IConnectionPoint*>(this);
-    AddRef();
-    return S_OK;
-}
-
-STDMETHODIMP_(ULONG) SimConnectionPoint::AddRef() { return m_container->AddRef(); }
-STDMETHODIMP_(ULONG) SimConnectionPoint::Release() { return m_container->Release(); }
+    : OwnedPart(container), m_container(container), m_events(events) {}
 
 STDMETHODIMP SimConnectionPoint::GetConnectionInterface(IID* iid) {
     if (!iid) return E_POINTER;

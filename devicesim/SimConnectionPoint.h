@@ -8,17 +8,16 @@
 #include <vector>
 
 #include "com/ComPtr.h"
+#include "com/UncountedObject.h"
 
-class SimConnectionPoint final : public IConnectionPoint {
+class SimConnectionPoint final : public OwnedPart<SimConnectionPoint, IConnectionPoint> {
 public:
     SimConnectionPoint(IConnectionPointContainer* container, REFIID events);
-    SimConnectionPoint(const SimConnectionPoint&) = delete;
-    SimConnectionPoint& operator=(const SimConnectionPoint&) = delete;
 
-    // IUnknown
-    STDMETHODIMP QueryInterface(REFIID riid, void** ppv) override;
-    STDMETHODIMP_(ULONG) AddRef() override;
-    STDMETHODIMP_(ULONG) Release() override;
+    BEGIN_INTERFACE_TABLE(SimConnectionPoint)
+        INTERFACE_ENTRY(IConnectionPoint)
+    END_INTERFACE_TABLE()
+
     // IConnectionPoint
     STDMETHODIMP GetConnectionInterface(IID* iid) override;
     STDMETHODIMP GetConnectionPointContainer(IConnectionPointContainer** container) override;
