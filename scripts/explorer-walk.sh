@@ -37,6 +37,7 @@ run="$build/wine-run"
 [ -n "$prefix" ] && export CALVEX_WINEPREFIX=$prefix
 export WINEPREFIX=${prefix:-$(sed -n 's/^export WINEPREFIX="${CALVEX_WINEPREFIX:-\(.*\)}"$/\1/p' "$run")}
 export WINEDEBUG=-all WINEDLLOVERRIDES="mscoree,mshtml=" WINEARCH=win64
+export TZ=${CALVEX_TEST_TZ:-America/New_York}  # as wine-run: the receivers' local times are checked below
 pass=0 fail=0
 ok() { pass=$((pass + 1)); }
 bad() { fail=$((fail + 1)); echo "FAIL: $*"; }
@@ -198,10 +199,10 @@ copy_all() {
     local same="bytes equal" timed="time equal" when
     if cmp -s "$file" "$copied"; then ok; else same="BYTES DIFFER"; bad "copied $name.qpr differs from the receiver's file or is missing"; fi
     when=$(sed -n "s/^$name=//p" "$folder/receiver.ini")
-    if [ -n "$when" ] && [ "$(stat -c %Y "$copied" 2>/dev/null)" = "$(date -u -d "$when" +%s)" ]; then ok
+    if [ -n "$when" ] && [ "$(stat -c %Y "$copied" 2>/dev/null)" = "$(date -d "$when" +%s)" ]; then ok
     else timed="TIME DIFFERS"; bad "copied $name.qpr does not carry the time $when"; fi
     say "$(printf '  %-16s %9s bytes  %s  %s, %s' "$name.qpr" "$(stat -c %s "$copied" 2>/dev/null)" \
-      "$(date -u -d "@$(stat -c %Y "$copied" 2>/dev/null || echo 0)" '+%Y-%m-%d %H:%M:%S')" "$same" "$timed")"
+      "$(date -d "@$(stat -c %Y "$copied" 2>/dev/null || echo 0)" '+%Y-%m-%d %H:%M:%S')" "$same" "$timed")"
   done
   [ "$(ls -A "$target" | grep -c 'calvex-partial')" -eq 0 ] && ok || bad "a temporary file was left in the target"
   rm -rf "$target"

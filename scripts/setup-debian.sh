@@ -11,6 +11,7 @@ packages=(
   xvfb xauth xdotool imagemagick               # windows without a screen, input, screenshots
   wixl msitools                                # the MSI installer (wixl), msibuild and msiinfo
   googletest                                   # sources, built with the MinGW toolchain
+  tzdata                                       # the tests run in a zone with daylight saving
 )
 
 missing=()

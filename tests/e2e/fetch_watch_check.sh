@@ -8,7 +8,6 @@ set -u
 build=$1
 run="$build/wine-run"
 prefix=${CALVEX_WINEPREFIX:-$build/wineprefix}
-export TZ=UTC  # the device's local times are compared with the files' times below
 work=$(mktemp -d /tmp/calvex-watch-XXXXXX)
 root=$work/root away=$work/away target=$work/target out=$work/out.txt
 mkdir -p "$root" "$away" "$target"
@@ -29,7 +28,7 @@ receiver() {  # receiver DIR BRAND SERIAL MODEL: 40,000 bytes a second
   printf '[Receiver]\r\nBrand=%s\r\nLabel=Test\r\nSerialNumber=%s\r\nModel=%s\r\nPortType=2\r\n[Transfer]\r\nRate=40000\r\n' \
     "$2" "$3" "$4" >"$1/receiver.ini"
 }
-stamp=1795000000
+stamp=1793000000  # late October: daylight saving time in the tests' zone, which has left by now
 log() {  # log DIR NAME BYTES: a file the receiver logs, with a time of its own, there at once
   stamp=$((stamp + 61))
   head -c "$3" /dev/urandom >"$work/$2.new"
@@ -41,6 +40,8 @@ receiver "$root/Calvex A" 1 1000-0001 A
 log "$root/Calvex A" LOG0001 3000
 receiver "$root/Calvex B" 1 1000-0002 B
 log "$root/Calvex B" LOG0001 2000
+log "$root/Calvex B" LOG0003 1500
+log "$root/Calvex B" LOG0004 1000
 receiver "$away/Brennor C" 2 2000-0003 C
 log "$away/Brennor C" LOG0001 4000
 "$run" "$build/CalvexDeviceSim.exe" /Quit
@@ -63,9 +64,16 @@ mv "$root/Calvex B" "$away/"
 waitfor "$out" "Calvex B@USB (1000-0002!B!USB) unplugged" 30
 [ -z "$(ls "$target/B@USB" | grep BIG0001)" ] || bad "a cut download left a file: $(ls "$target/B@USB")"
 log "$away/Calvex B" LOG0002 1000
+# Meanwhile one file got a new time at the same size, one new bytes at the same time: both come
+# again once B is back; LOG0004, unchanged, does not.
+touch -d "@$((stamp + 86400))" "$away/Calvex B/LOG0001"
+head -c 1600 /dev/urandom >"$away/Calvex B/LOG0003.new"
+touch -r "$away/Calvex B/LOG0003" "$away/Calvex B/LOG0003.new"
+mv "$away/Calvex B/LOG0003.new" "$away/Calvex B/LOG0003"
 mv "$away/Calvex B" "$root/"
 waitfor "$out" "B@USB (1000-0002!B!USB) plugged in -> " 30
 waitfor "$out" "fetched     B@USB\\LOG0002" 30
+waitfor "$out" "fetched     B@USB\\LOG0003.qpr  1.6 KB" 30
 # Stopped by a real Ctrl+C while a download runs: discarded, and nothing failed.
 log "$root/Calvex A" BIG0002 200000
 downloading "Calvex A" BIG0002 && sleep 1
@@ -98,8 +106,9 @@ for file in "$root"/*/*; do
   if [ -z "$got" ]; then bad "$dir/$name was not fetched"; continue; fi
   cmp -s "$file" "$got" || bad "$dir/$name differs"
   [ "$(stat -c %Y "$file")" = "$(stat -c %Y "$got")" ] || bad "$dir/$name has not the device's time"
-  count=$(grep -cE "  fetched     ${dir#* }@USB\\\\$name(\.qpr)?  " "$out")
-  [ "$count" = 1 ] || bad "$dir/$name fetched $count times"
+  count=$(grep -cE "  fetched     ${dir#* }@USB\\\\$name(\.qpr)?  " "$out") want=1
+  case "$dir/$name" in "Calvex B/LOG0001" | "Calvex B/LOG0003") want=2 ;; esac  # changed while away
+  [ "$count" = $want ] || bad "$dir/$name fetched $count times"
 done
 [ "$(find "$target" -type f | wc -l)" = $expected ] || bad "other files were left: $(find "$target" -type f)"
 rm -rf "$work"

@@ -1,4 +1,4 @@
-// Guards calvex-fetch end to end through the shell: what it fetches, skips and re-fetches, byte-identical files with the device's times, receiver and brand selection, dry runs that write nothing, its exit codes and messages, and failed downloads that leave no file behind.
+// Guards calvex-fetch end to end through the shell: what it fetches, skips and re-fetches (a file changed on the device included), byte-identical files with the device's times in a zone with daylight saving, what lands for each choice of brand and receiver in a batch and in a watch, its exit codes and messages, and failed downloads that leave no file behind.
 #include <windows.h>
 
 #include <gtest/gtest.h>
@@ -16,43 +16,26 @@ namespace {
 struct FetchRun {
     DWORD exitCode = WAIT_TIMEOUT;
     std::string out, err;
-    int Count(const std::string& text) const {
-        int count = 0;
-        for (size_t at = out.find(text); at != std::string::npos; at = out.find(text, at + 1)) ++count;
-        return count;
-    }
+    int Count(const std::string& text) const { return CountOf(out, text); }
 };
 
+// A watch runs until a timeout ends it (exit code WAIT_TIMEOUT), once it had time to fetch.
 FetchRun RunFetch(const std::wstring& arguments) {
     FetchRun run;
-    run.exitCode = RunProcess(L"\"" + BuildDir() + L"\\calvex-fetch.exe\" " + arguments, 300000, &run.out, &run.err);
+    const DWORD timeout = arguments.find(L"--watch ") != std::wstring::npos ? 25000 : 300000;
+    run.exitCode = RunProcess(L"\"" + BuildDir() + L"\\calvex-fetch.exe\" " + arguments, timeout, &run.out, &run.err);
     return run;
 }
 
 std::wstring Quoted(const std::wstring& path) { return L"\"" + path + L"\""; }
-
-// Every file below dir, as paths relative to it.
-std::vector<std::wstring> ListFiles(const std::wstring& dir, const std::wstring& prefix = L"") {
-    std::vector<std::wstring> files;
-    WIN32_FIND_DATAW found;
-    HANDLE find = FindFirstFileW((dir + L"\\*").c_str(), &found);
-    for (BOOL more = find != INVALID_HANDLE_VALUE; more; more = FindNextFileW(find, &found)) {
-        const std::wstring name = found.cFileName;
-        if (name == L"." || name == L"..") continue;
-        if (!(found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)) files.push_back(prefix + name);
-        for (const std::wstring& file : ListFiles(dir + L"\\" + name, prefix + name + L"\\")) files.push_back(file);
-    }
-    if (find != INVALID_HANDLE_VALUE) FindClose(find);
-    return files;
-}
 
 class FetchToolTest : public testing::Test {
 protected:
     TempDirectory target{L"calvex-fetch-target"};
 };
 
-// The sample receivers, then again after one file appeared on a device: only that one is new.
-TEST_F(FetchToolTest, FetchesWhatIsNewAndOnlyThat) {
+// The sample receivers, odd names included: every file, whole, and nothing else.
+TEST_F(FetchToolTest, FetchesEverySampleFileWhole) {
     TempDirectory device(L"calvex-fetch-device");
     ASSERT_EQ(0u, RunProcess(L"xcopy /E /I /Q /Y " + Quoted(SourceDir() + L"\\sample-receivers") + L" " +
                              Quoted(device.Path())));
@@ -61,66 +44,79 @@ TEST_F(FetchToolTest, FetchesWhatIsNewAndOnlyThat) {
     const FetchRun first = RunFetch(Quoted(target.Path()));
     ASSERT_EQ(0u, first.exitCode) << first.out << first.err;
     EXPECT_EQ(1, first.Count("22 fetched, 0 skipped, 0 failed, 4.0 MB in ")) << first.out;
-    struct Arrived {
-        const wchar_t* fetched;
-        const wchar_t* onDevice;
-        SYSTEMTIME time;  // the device's local time, taken over without a zone shift
+    const std::pair<const wchar_t*, const wchar_t*> arrived[] = {  // fetched, on the device
+        {L"Q9 GNSS@USB\\LOG0001.qpr", L"Calvex Q9 USB\\LOG0001"}, {L"R2_Net@COM4\\LOG0002", L"Brennor R2 COM4\\LOG0002"},
+        {L"Compact \u00DC_2@USB\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02", L"Brennor odd names\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02"},
     };
-    const Arrived arrived[] = {
-        {L"Q9 GNSS@USB\\LOG0001.qpr", L"Calvex Q9 USB\\LOG0001", {2026, 11, 0, 3, 6, 30, 0, 0}},
-        {L"Compact \u00DC_2@USB\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02", L"Brennor odd names\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02",
-         {2026, 9, 0, 5, 7, 7, 7, 0}},
-        {L"R2_Net@COM4\\LOG0002", L"Brennor R2 COM4\\LOG0002", {2026, 10, 0, 31, 8, 5, 30, 0}},
-    };
-    for (const Arrived& file : arrived) {
-        SCOPED_TRACE(Narrow(file.fetched));
-        const std::wstring path = target.Path() + L"\\" + file.fetched;
-        EXPECT_EQ(ReadFileBytes(device.Path() + L"\\" + file.onDevice), ReadFileBytes(path));
-        WIN32_FILE_ATTRIBUTE_DATA data = {};
-        GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &data);
-        FILETIME expected = {};
-        SystemTimeToFileTime(&file.time, &expected);
-        EXPECT_EQ(0, CompareFileTime(&expected, &data.ftLastWriteTime)) << "the device's time";
+    for (const auto& file : arrived) {
+        EXPECT_EQ(ReadFileBytes(device.Path() + L"\\" + file.second), ReadFileBytes(target.Path() + L"\\" + file.first))
+            << Narrow(file.first);
     }
     EXPECT_EQ(22u, ListFiles(target.Path()).size()) << "no temporary or stray file";
-
-    ASSERT_TRUE(CopyFileW((device.Path() + L"\\Calvex Z5 COM12\\DATA0001").c_str(),
-                          (device.Path() + L"\\Calvex Z5 COM12\\DATA0003").c_str(), FALSE));
-    Sleep(1000);  // the simulator sees the new file within 0.2 s
-    const FetchRun third = RunFetch(Quoted(target.Path()));
-    EXPECT_EQ(0u, third.exitCode);
-    EXPECT_EQ(1, third.Count("1 fetched, 22 skipped, 0 failed, 2.0 KB in ")) << third.out;
-    EXPECT_EQ(1, third.Count("  fetched     DATA0003.qpr  2.0 KB")) << third.out;
-
-    const FetchRun again = RunFetch(L"--all --receiver Z/5@COM12 " + Quoted(target.Path()));
-    EXPECT_EQ(0u, again.exitCode) << again.err;
-    EXPECT_EQ(1, again.Count("3 fetched, 0 skipped, 0 failed, 8.0 KB in ")) << again.out;
 }
-// Dry runs over the sample receivers: which receivers the options pick, and nothing written.
-TEST_F(FetchToolTest, PicksReceiversByKeyDisplayNameAndBrand) {
-    struct Pick {
-        const wchar_t* options;
-        int receivers;                 // header lines
-        int files;                     // "would fetch" lines
-        std::vector<const char*> headers;
+
+// Receivers of both brands: what lands for each choice of brand and receiver (key or display
+// name, any case), in a batch and in a watch.
+TEST_F(FetchToolTest, EachChoiceOfBrandAndReceiverLandsExactlyItsFiles) {
+    ReceiverTree tree;
+    const std::pair<ReceiverSetup, const wchar_t*> receivers[] = {  // and the one file each holds
+        {{L"Calvex 1", 1, L"Test receiver", L"1000-0001", L"C1/X", 1, L"COM3"}, L"CA"},
+        {{L"Calvex 2", 1, L"Test receiver", L"1000-0002", L"C2"}, L"CB"},
+        {{L"Brennor 1", 2, L"Test receiver", L"2000-0001", L"B1"}, L"BA"}};
+    for (const auto& receiver : receivers) tree.AddReceiver(receiver.first), tree.AddFile(receiver.first.folder, receiver.second, 1000);
+    DeviceSimScope scope(tree.Root());
+    const std::wstring ca = L"C1_X@COM3\\CA.qpr", cb = L"C2@USB\\CB.qpr", ba = L"B1@USB\\BA";
+    const struct { const wchar_t* options; std::vector<std::wstring> landed; } picks[] = {
+        {L"", {ba, ca, cb}},
+        {L"--brand all", {ba, ca, cb}},
+        {L"--brand calvex", {ca, cb}},
+        {L"--brand brennor", {ba}},
+        {L"--receiver c1/x@com3", {ca}},
+        {L"--receiver 2000-0001!b1!usb", {ba}},
+        {L"--brand calvex --receiver C2@USB --receiver 1000-0001!C1#X!COM3", {ca, cb}},
+        {L"--dry-run --brand brennor", {}},
+        {L"--watch --brand brennor", {ba}},
+        {L"--watch --brand all --receiver c2@usb", {cb}},
+        {L"--watch --receiver 1000-0001!c1#x!com3 --receiver B1@USB", {ba, ca}},
     };
-    const Pick picks[] = {
-        {L"--receiver Q7/RTK@COM3", 1, 3, {"Calvex Q7/RTK@COM3 (5211-40125!Q7#RTK!COM3) -> "}},
-        {L"--receiver 5211-40125!Q7#RTK!COM3", 1, 3, {"Calvex Q7/RTK@COM3 (5211-40125!Q7#RTK!COM3) -> "}},
-        {L"--receiver r2/net@com4 --receiver Z/5@COM12", 2, 4, {"Calvex Z/5@COM12 (", "Brennor R2/Net@COM4 ("}},
-        {L"--brand brennor", 3, 10, {"Brennor HVL3-GNSS@USB (", "Brennor R2/Net@COM4 ("}},
-        {L"--brand calvex", 4, 12, {"Calvex Q7/L1-L2@Unknown (", "Calvex Q9 GNSS@USB ("}},
-    };
-    const std::wstring folder = target.Path() + L"\\not-yet";
-    for (const Pick& pick : picks) {
+    for (const auto& pick : picks) {
         SCOPED_TRACE(Narrow(pick.options));
-        const FetchRun run = RunFetch(std::wstring(L"--dry-run ") + pick.options + L" " + Quoted(folder));
-        EXPECT_EQ(0u, run.exitCode) << run.err;
-        EXPECT_EQ(pick.receivers, run.Count(" -> ")) << run.out;
-        EXPECT_EQ(pick.files, run.Count("  would fetch ")) << run.out;
-        for (const char* header : pick.headers) EXPECT_EQ(1, run.Count(header)) << run.out;
-        EXPECT_EQ(1, run.Count("dry run: " + std::to_string(pick.files) + " to fetch, 0 skipped, 0 failed")) << run.out;
-        EXPECT_EQ(INVALID_FILE_ATTRIBUTES, GetFileAttributesW(folder.c_str())) << "a dry run writes nothing";
+        const std::wstring into = target.Path() + L"\\into";
+        const FetchRun run = RunFetch(std::wstring(pick.options) + L" " + Quoted(into));
+        EXPECT_EQ(wcsstr(pick.options, L"--watch") ? WAIT_TIMEOUT : 0u, run.exitCode) << run.out << run.err;
+        EXPECT_EQ(pick.landed, ListFiles(into)) << run.out;
+        EXPECT_EQ(!pick.landed.empty(), FileExists(into)) << "a dry run writes nothing";
+        DeleteTree(into);
+    }
+}
+
+// A device file whose time or size changed comes again, in a batch and in a watch, as does a
+// new one; one with neither changed does not, unless --all. Every file keeps the device's time,
+// on both sides of the zone's daylight saving change.
+TEST_F(FetchToolTest, FetchesAgainWhatChangedOnTheDevice) {
+    ReceiverTree tree;
+    const std::wstring device = tree.AddReceiver({L"Calvex 1"}) + L"\\", fetched = target.Path() + L"\\Q9 GNSS@USB\\";
+    const SYSTEMTIME october = {2026, 10, 0, 20, 15, 0, 0, 0}, november = {2026, 11, 0, 20, 15, 0, 0, 0};
+    std::vector<std::wstring> names = {L"SAME", L"RETIMED", L"RESIZED"};
+    for (const std::wstring& name : names) SetWriteTime(tree.AddFile(L"Calvex 1", name, 1000), october);
+    DeviceSimScope scope(tree.Root());
+    EXPECT_EQ(1, RunFetch(Quoted(target.Path())).Count("3 fetched, 0 skipped, 0 failed"));
+    const struct { const wchar_t* options; SYSTEMTIME retimed; size_t resized; int same; } changes[] = {
+        {L"--new", november, 1200, 0}, {L"--watch", october, 900, 0}, {L"--all", november, 900, 1}};
+    for (const auto& change : changes) {
+        SCOPED_TRACE(Narrow(change.options));
+        SetWriteTime(device + L"RETIMED", change.retimed);
+        SetWriteTime(tree.AddFile(L"Calvex 1", L"RESIZED", std::string(change.resized, 'r')), october);
+        names.push_back(L"NEW" + std::to_wstring(names.size()));
+        SetWriteTime(tree.AddFile(L"Calvex 1", names.back(), 500), november);  // a device keeps whole seconds
+        const FetchRun run = RunFetch(change.options + (L" " + Quoted(target.Path())));
+        for (const std::wstring& name : {std::wstring(L"RETIMED"), std::wstring(L"RESIZED"), names.back()})
+            EXPECT_EQ(1, run.Count(Narrow(name) + ".qpr  ")) << run.out;
+        EXPECT_EQ(change.same, run.Count("SAME.qpr  ")) << run.out;
+        for (const std::wstring& name : names) {
+            EXPECT_EQ(ReadFileBytes(device + name), ReadFileBytes(fetched + name + L".qpr")) << Narrow(name);
+            EXPECT_EQ(WriteTime(device + name), WriteTime(fetched + name + L".qpr")) << Narrow(name) << ": the device's time";
+        }
     }
 }
 

@@ -1,4 +1,4 @@
-// Guards large receivers: a burst of file events that floods Explorer with notifications or view re-fills, and 2,000 files listed, sorted or copied wrongly.
+// Guards large receivers: a burst of file events that floods Explorer with notifications or view re-fills, and 2,000 files listed or sorted wrongly.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -7,7 +7,6 @@
 #include <string>
 #include <vector>
 
-#include "VirtualFiles.h"
 #include "items/CCalvexReceiversNotifyWindow.h"
 #include "items/CReceiversPidlMgr.h"
 #include "module/ModuleApp.h"
@@ -79,7 +78,7 @@ TEST_F(ReceiverLoadTest, BurstOfAThousandFileEventsGivesOneNotificationAndFewRef
     EXPECT_LE(fills, 2u);
 }
 
-TEST_F(ReceiverLoadTest, TwoThousandFilesListSortAndCopy) {
+TEST_F(ReceiverLoadTest, TwoThousandFilesListAndSort) {
     ReceiverSetup setup;
     setup.folder = L"Calvex A";
     setup.extraLines.push_back(L"[Times]");
@@ -119,16 +118,4 @@ TEST_F(ReceiverLoadTest, TwoThousandFilesListSortAndCopy) {
         EXPECT_EQ(0, wrong);
     }
 
-    // A few copied out, byte for byte.
-    TempDirectory target(L"calvex-load-target");
-    for (int pick : {0, 1234, kFiles - 1}) {
-        SCOPED_TRACE(pick);
-        ComPtr<IDataObject> data;
-        ASSERT_EQ(S_OK, receiver->GetUIObjectOf(nullptr, 1, &byIndex[pick], IID_IDataObject, nullptr, data.PutVoid()));
-        int failed = 0;
-        EXPECT_EQ(1, PasteVirtualFiles(data.Get(), target.Path(), [](const std::wstring&) {}, failed));
-        const std::wstring name = FileName(pick);
-        EXPECT_TRUE(ReadFileBytes(target.Path() + L"\\" + name + L".qpr") ==
-                    ReadFileBytes(tree.FolderPath(L"Calvex A") + L"\\" + name));
-    }
 }

@@ -1,18 +1,22 @@
-// End to end copy out of receivers: files pasted by calvex-paste in its own process must arrive byte-identical; slow, cancelled, failing and dying downloads must show rising progress, end with the right answer, show one error box, never hang and leave no file behind.
+// End to end copy out of receivers: files pasted by calvex-paste in its own process must arrive byte-identical; the view's Copy of part of its rows must carry exactly those rows (descriptors, "Shell IDList Array", pasted files) with the device's times; slow, cancelled, failing and dying downloads must show rising progress, end with the right answer, show one error box, never hang and leave no file behind.
 #include <windows.h>
 #include <commctrl.h>
 #include <shlobj.h>
 
 #include <gtest/gtest.h>
 
-#include <filesystem>
+#include <algorithm>
+#include <map>
 #include <string>
 #include <vector>
 
 #include "module/ModuleApp.h"
 #include "support/DeviceSim.h"
 #include "support/ViewHost.h"
+#include "com/Bstr.h"
 #include "items/CReceiversPidlMgr.h"
+#include "view/ViewCommands.h"
+#include "VirtualFiles.h"
 
 using namespace testsupport;
 
@@ -28,12 +32,6 @@ const struct { const wchar_t* serial; Texts lines; std::vector<std::pair<const w
     {L"1000-0005", {L"[Fail]", L"IReceiverFile.Download=0x80070005"}, {{L"REFUSED", 1000}}},
     {L"1000-0006", {L"[Transfer]", L"Rate=100000", L"FailAtPercent=50", L"FailResult=1"}, {{L"ODD", 200000}}},
 };
-
-int Count(const std::string& text, const std::string& part) {
-    int count = 0;
-    for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) ++count;
-    return count;
-}
 
 // What a timer of this thread sees of the download dialog while it runs.
 struct DialogWatch {
@@ -131,12 +129,9 @@ TEST_F(TransferPasteTest, OneFileOutcomes) {
             RunProcess(L"\"" + BuildDir() + L"\\calvex-paste.exe\" \"" + target.Path() + L"\"", 90000, &output, &output);
         EXPECT_EQ(c.arrives ? 0u : 1u, exitCode) << output;
         EXPECT_LT(GetTickCount() - started, c.withinMs) << "no hang; a cancel ends the download early";
-        EXPECT_EQ(c.boxes, Count(output, "message box:")) << output;
-        EXPECT_EQ(c.arrives ? 0 : 1, Count(output, "no contents (0x00000001)")) << "FileContents: S_FALSE\n" << output;
-        Texts left;
-        for (const auto& entry : std::filesystem::directory_iterator(target.Path()))
-            left.push_back(entry.path().filename());
-        EXPECT_EQ(c.arrives ? Texts{c.file} : Texts{}, left) << "nothing partial left";
+        EXPECT_EQ(c.boxes, CountOf(output, "message box:")) << output;
+        EXPECT_EQ(c.arrives ? 0 : 1, CountOf(output, "no contents (0x00000001)")) << "FileContents: S_FALSE\n" << output;
+        EXPECT_EQ(c.arrives ? Texts{c.file} : Texts{}, ListFiles(target.Path())) << "nothing partial left";
         EXPECT_TRUE(TraceContains(std::string("CProgressDialogMFC::") + c.dialogTrace));
         const std::vector<int>& seen = g_watch.positions;
         EXPECT_EQ(c.progress, !seen.empty() && seen.back() > 0);
@@ -146,6 +141,69 @@ TEST_F(TransferPasteTest, OneFileOutcomes) {
         EXPECT_GE(seen.size(), 3u) << "the dialog was seen moving";
         EXPECT_EQ(L"Downloading file " + std::wstring(c.file) + L", " + std::to_wstring(seen.back()) + L"% completed",
                   g_watch.lastText);
+    }
+}
+
+// Copy of some rows of many (two, the last, rows apart): the descriptors, the "Shell IDList
+// Array" and the files calvex-paste writes are exactly those rows in order, with the device's
+// times (also in the Time column) on both sides of the zone's daylight saving change.
+TEST_F(TransferPasteTest, CopyOfSomeRowsCarriesExactlyThoseRows) {
+    ReceiverSetup setup;
+    setup.folder = setup.serialNumber = L"1000-0001";  // listed first
+    const std::wstring device = tree.AddReceiver(setup) + L"\\";
+    std::map<std::wstring, SYSTEMTIME> local;  // by listed name: the time as the device reports it
+    for (int i = 0; i < 12; ++i) {
+        const std::wstring name = L"LOG" + std::to_wstring(10 + i);
+        const SYSTEMTIME utc = {2026, WORD(10 + i % 2), 0, WORD(i % 2 ? 2 + i / 2 : 25 + i / 2), 15, 0, 0, 0};
+        SetWriteTime(tree.AddFile(setup.folder, name, 100 + 37 * i), utc);
+        SystemTimeToTzSpecificLocalTime(nullptr, &utc, &local[name + L".qpr"]);
+    }
+    TestBrowser browser;
+    HostedView host(OurFolder(true), browser);
+    ASSERT_EQ(12, host.Count());
+    for (const std::vector<int>& rows : {std::vector<int>{3, 4}, {11}, {0, 5, 9}, {1, 2, 7, 10}}) {
+        SCOPED_TRACE(testing::PrintToString(rows));
+        ListView_SetItemState(host.list, -1, 0, LVIS_SELECTED);
+        for (int row : rows) host.Select(row);
+        host.Object()->OnCommand(ViewCommandCopy);
+        ASSERT_EQ(S_OK, OleGetClipboard(&data));
+        std::vector<FILEDESCRIPTORW> files;
+        ASSERT_EQ(S_OK, ReadFileDescriptors(data.Get(), files));
+        FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_SHELLIDLIST)), nullptr, 1, -1, TYMED_HGLOBAL};
+        STGMEDIUM medium = {};
+        ASSERT_EQ(S_OK, data->GetData(&format, &medium));
+        const auto* cida = static_cast<const CIDA*>(GlobalLock(medium.hGlobal));
+        ASSERT_EQ(std::make_pair(rows.size(), rows.size()), std::make_pair(files.size(), size_t(cida->cidl)));
+        Texts chosen;
+        for (size_t i = 0; i < rows.size(); ++i) {
+            wchar_t name[64] = L"", shown[64] = L"";
+            ListView_GetItemText(host.list, rows[i], 0, name, 64);
+            ListView_GetItemText(host.list, rows[i], 2, shown, 64);
+            chosen.push_back(name);
+            const auto child = reinterpret_cast<LPCITEMIDLIST>(reinterpret_cast<const BYTE*>(cida) + cida->aoffset[i + 1]);
+            EXPECT_EQ(chosen.back(), CReceiversPidlMgr().GetData(child)->name);
+            EXPECT_EQ(chosen.back(), files[i].cFileName);
+            EXPECT_EQ(ReadFileBytes(device + chosen.back().substr(0, 5)).size(), files[i].nFileSizeLow);
+            // The descriptor carries the device's clock as it stands.
+            EXPECT_EQ(Ticks(local[name]), Ticks(files[i].ftLastWriteTime));
+            DATE date = 0;
+            Bstr text;
+            SystemTimeToVariantTime(&local[name], &date);
+            VarBstrFromDate(date, LOCALE_USER_DEFAULT, 0, text.Put());
+            EXPECT_STREQ(text.Get(), shown) << "the Time column shows the device's time";
+        }
+        GlobalUnlock(medium.hGlobal);
+        ReleaseStgMedium(&medium);
+        data.Reset();
+        TempDirectory target(L"calvex-paste-rows");
+        EXPECT_EQ(0u, RunProcess(L"\"" + BuildDir() + L"\\calvex-paste.exe\" \"" + target.Path() + L"\""));
+        const Texts pasted = ListFiles(target.Path());
+        for (const std::wstring& name : pasted) {
+            EXPECT_EQ(WriteTime(device + name.substr(0, 5)), WriteTime(target.Path() + L"\\" + name)) << "the device's time";
+            EXPECT_EQ(ReadFileBytes(device + name.substr(0, 5)), ReadFileBytes(target.Path() + L"\\" + name));
+        }
+        std::sort(chosen.begin(), chosen.end());
+        EXPECT_EQ(chosen, pasted) << "exactly the chosen rows";
     }
 }
 }  // namespace

@@ -149,4 +149,47 @@ bool DeleteTree(const std::wstring& path) {
     return SHFileOperationW(&op) == 0;
 }
 
+std::vector<std::wstring> ListFiles(const std::wstring& dir, const std::wstring& prefix) {
+    std::vector<std::wstring> files;
+    WIN32_FIND_DATAW found;
+    HANDLE find = FindFirstFileW((dir + L"\\*").c_str(), &found);
+    for (BOOL more = find != INVALID_HANDLE_VALUE; more; more = FindNextFileW(find, &found)) {
+        const std::wstring name = found.cFileName;
+        if (name == L"." || name == L"..") continue;
+        if (!(found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY)) files.push_back(prefix + name);
+        for (const std::wstring& file : ListFiles(dir + L"\\" + name, prefix + name + L"\\")) files.push_back(file);
+    }
+    if (find != INVALID_HANDLE_VALUE) FindClose(find);
+    std::sort(files.begin(), files.end());
+    return files;
+}
+
+int CountOf(const std::string& text, const std::string& part) {
+    int count = 0;
+    for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) ++count;
+    return count;
+}
+
+LONGLONG Ticks(const FILETIME& time) { return static_cast<LONGLONG>(time.dwHighDateTime) << 32 | time.dwLowDateTime; }
+
+LONGLONG WriteTime(const std::wstring& path) {
+    WIN32_FILE_ATTRIBUTE_DATA data = {};
+    GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &data);
+    return Ticks(data.ftLastWriteTime);
+}
+
+LONGLONG Ticks(const SYSTEMTIME& utc) {
+    FILETIME time = {};
+    SystemTimeToFileTime(&utc, &time);
+    return Ticks(time);
+}
+
+void SetWriteTime(const std::wstring& path, const SYSTEMTIME& utc) {
+    FILETIME time = {};
+    SystemTimeToFileTime(&utc, &time);
+    HANDLE file = CreateFileW(path.c_str(), FILE_WRITE_ATTRIBUTES, 0, nullptr, OPEN_EXISTING, 0, nullptr);
+    SetFileTime(file, nullptr, nullptr, &time);
+    CloseHandle(file);
+}
+
 }  // namespace testsupport

@@ -44,6 +44,14 @@ std::vector<TaskPidl> ListItems(IShellFolder* folder, SHCONTF flags, HRESULT* re
 std::string Narrow(const std::wstring& text);  // UTF-8
 std::wstring Wide(const std::string& text);
 bool DeleteTree(const std::wstring& path);  // a directory with its contents
+// Every file below dir, as paths relative to it ("sub\\name"), sorted.
+std::vector<std::wstring> ListFiles(const std::wstring& dir, const std::wstring& prefix = L"");
+int CountOf(const std::string& text, const std::string& part);  // occurrences
+// Times in 100 ns units: a file's last write, a FILETIME, a SYSTEMTIME read as UTC.
+LONGLONG WriteTime(const std::wstring& path);
+LONGLONG Ticks(const FILETIME& time);
+LONGLONG Ticks(const SYSTEMTIME& utc);
+void SetWriteTime(const std::wstring& path, const SYSTEMTIME& utc);
 
 // A fresh empty directory under %TEMP%, removed with its contents on destruction.
 class TempDirectory {

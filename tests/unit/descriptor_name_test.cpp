@@ -39,54 +39,39 @@ void ExpectRule(const NameCase& row, const SafeName& safe) {
 
 TEST(DescriptorNameTest, RefusesOrMakesSafeEveryHostileForm) {
     const NameCase rows[] = {
-        {L"LOG0001.qpr", L"LOG0001.qpr"},
-        {L"Mesure été.log", L"Mesure été.log"},
-        {L"", Refused},
-        {L"\\evil.qpr", Refused},
-        {L"\\\\server\\share\\evil", Refused},
-        {L"//server/share/evil", Refused},
-        {L"\\\\?\\C:\\evil", Refused},
-        {L"C:evil", Refused},
-        {L"c:\\Windows\\evil", Refused},
-        {L"..", Refused},
-        {L"a/../../evil", Refused},
-        {L"a\\.\\b", Refused},
-        {L"a\\\\b", Refused},
-        {L"dir\\", Refused},
-        {L" . ", Refused},
-        {L"CON", L"_CON"},
-        {L"nul.txt", L"_nul.txt"},
-        {L"Com1.log", L"_Com1.log"},
-        {L"LPT9", L"_LPT9"},
-        {L"AUX .txt", L"_AUX .txt"},
-        {L"prn\\x", L"_prn\\x"},
-        {L"COM0", L"COM0"},
-        {L"CONSOLE.log", L"CONSOLE.log"},
-        {std::wstring(L"a\x01" L"b"), L"a_b"},
-        {L"tab\there\x7f", L"tab_here_"},
-        {L"what?<>|*\".log", L"what______.log"},
-        {L"LOG:stream", L"LOG_stream"},
-        {L"name. . .", L"name"},
-        {L"sub. \\file ", L"sub\\file"},
-        {L"sub/file", L"sub\\file"},
-        {std::wstring(43, L'n'), std::wstring(43, L'n'), 200},  // 200 + 1 + 43 + the temporary suffix = 259
-        {std::wstring(44, L'n'), Refused, 200},
-        {L"sub\\" + std::wstring(39, L'n'), L"sub\\" + std::wstring(39, L'n'), 200},
-        {L"sub\\" + std::wstring(40, L'n'), Refused, 200},
+        {L"LOG0001.qpr", L"LOG0001.qpr"}, {L"Mesure été.log", L"Mesure été.log"},
+        // Refused: empty, absolute, drive, UNC or device prefixes, empty, "." or ".." components.
+        {L"", Refused}, {L"\\evil.qpr", Refused}, {L"\\\\server\\share\\evil", Refused}, {L"//server/share/evil", Refused},
+        {L"\\\\?\\C:\\evil", Refused}, {L"C:evil", Refused}, {L"c:\\Windows\\evil", Refused}, {L"..", Refused},
+        {L"a/../../evil", Refused}, {L"a\\.\\b", Refused}, {L"a\\\\b", Refused}, {L"dir\\", Refused}, {L" . ", Refused},
+        // Reserved device names in every form Windows refuses; the names around them stay.
+        {L"CON", L"_CON"}, {L"con", L"_con"}, {L"Con.txt", L"_Con.txt"}, {L"nul.tar.gz", L"_nul.tar.gz"},
+        {L"CON.", L"_CON"}, {L"AUX .txt", L"_AUX .txt"}, {L"NUL  ", L"_NUL"}, {L"prn. .", L"_prn"},
+        {L"COM\u00B9", L"_COM\u00B9"}, {L"com\u00B2.log", L"_com\u00B2.log"}, {L"LPT\u00B3", L"_LPT\u00B3"},
+        {L"CONIN$", L"_CONIN$"}, {L"conout$.txt", L"_conout$.txt"}, {L"con.txt:ads", L"_con.txt_ads"},
+        {L"prn\\x", L"_prn\\x"}, {L"dir/lpt1/Aux.d/x", L"dir\\_lpt1\\_Aux.d\\x"}, {L"CON. \\x", L"_CON\\x"},
+        {L"COM0", L"COM0"}, {L"LPT0.log", L"LPT0.log"}, {L"COM10", L"COM10"}, {L"COM\u2074", L"COM\u2074"},
+        {L"CONSOLE.log", L"CONSOLE.log"}, {L"NULL.txt", L"NULL.txt"}, {L"xCON", L"xCON"}, {L"CLOCK$", L"CLOCK$"},
+        {std::wstring(L"a\x01" L"b"), L"a_b"}, {L"tab\there\x7f", L"tab_here_"}, {L"what?<>|*\".log", L"what______.log"},
+        {L"LOG:stream", L"LOG_stream"}, {L"name. . .", L"name"}, {L"sub. \\file ", L"sub\\file"}, {L"sub/file", L"sub\\file"},
+        // Lengths: 200 + 1 + 43 + the temporary suffix = 259.
+        {std::wstring(43, L'n'), std::wstring(43, L'n'), 200}, {std::wstring(44, L'n'), Refused, 200},
+        {L"sub\\" + std::wstring(39, L'n'), L"sub\\" + std::wstring(39, L'n'), 200}, {L"sub\\" + std::wstring(40, L'n'), Refused, 200},
         {std::wstring(255, L'n'), Refused},
     };
     for (const NameCase& row : rows) ExpectRule(row, MakeSafeDescriptorName(row.given, row.target));
+    for (const std::wstring device : {L"COM", L"lpt"}) {
+        for (wchar_t digit = L'1'; digit <= L'9'; ++digit) {
+            const std::wstring name = device + digit + L".qpr";
+            ExpectRule({name, L"_" + name}, MakeSafeDescriptorName(name, 20));
+        }
+    }
 }
 
 TEST(DescriptorNameTest, FolderNamesFromDisplayNamesStayOneComponent) {
     const NameCase rows[] = {
-        {L"HVL3-GNSS@USB", L"HVL3-GNSS@USB"},
-        {L"Q7/RTK@COM3", L"Q7_RTK@COM3"},
-        {L"..\\..\\Windows", L".._.._Windows"},
-        {L"C:\\x", L"C__x"},
-        {L"NUL", L"_NUL"},
-        {L"", Refused},
-        {L"..", Refused},
+        {L"HVL3-GNSS@USB", L"HVL3-GNSS@USB"}, {L"Q7/RTK@COM3", L"Q7_RTK@COM3"}, {L"..\\..\\Windows", L".._.._Windows"},
+        {L"C:\\x", L"C__x"}, {L"NUL", L"_NUL"}, {L"", Refused}, {L"..", Refused},
         {std::wstring(256, L'r'), Refused},
     };
     for (const NameCase& row : rows) ExpectRule(row, MakeSafeFolderName(row.given, row.target));

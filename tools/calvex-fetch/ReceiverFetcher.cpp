@@ -20,7 +20,8 @@ bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descripto
     if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &found)) return false;
     if (found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) return false;
     const ULONGLONG size = (static_cast<ULONGLONG>(found.nFileSizeHigh) << 32) | found.nFileSizeLow;
-    return size == DescriptorSize(descriptor) && CompareFileTime(&found.ftLastWriteTime, &descriptor.ftLastWriteTime) == 0;
+    const FILETIME time = DescriptorWriteTime(descriptor);
+    return size == DescriptorSize(descriptor) && CompareFileTime(&found.ftLastWriteTime, &time) == 0;
 }
 
 void ReceiverFetcher::Run(IShellFolder* receiver, const std::wstring& targetDir) {

@@ -33,14 +33,17 @@ void Note(SafeName& result, const wchar_t* change) {
     result.reason += change;
 }
 
-// CON, PRN, AUX, NUL, COM1-9, LPT1-9, also with an extension or trailing spaces before it.
+// CON, PRN, AUX, NUL, COM1-9, LPT1-9 (also with the superscript digits 1-3, which Windows
+// reserves as well), CONIN$ and CONOUT$: in any case, with any extension ("nul.tar.gz") and
+// with spaces before it.
 bool IsReservedDeviceName(const std::wstring& component) {
     std::wstring base = component.substr(0, component.find(L'.'));
     while (!base.empty() && base.back() == L' ') base.pop_back();
     for (wchar_t& c : base) c = static_cast<wchar_t>(towupper(c));
-    if (base == L"CON" || base == L"PRN" || base == L"AUX" || base == L"NUL") return true;
+    if (base == L"CON" || base == L"PRN" || base == L"AUX" || base == L"NUL" || base == L"CONIN$" || base == L"CONOUT$")
+        return true;
     return base.size() == 4 && (base.compare(0, 3, L"COM") == 0 || base.compare(0, 3, L"LPT") == 0) &&
-           base[3] >= L'1' && base[3] <= L'9';
+           ((base[3] >= L'1' && base[3] <= L'9') || wcschr(L"\u00B9\u00B2\u00B3", base[3]) != nullptr);
 }
 
 bool IsForbiddenCharacter(wchar_t c) {

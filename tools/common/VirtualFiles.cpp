@@ -64,12 +64,13 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     ULONGLONG written = 0;
     HRESULT hr = CopyStream(stream, file, written);
     const ULONGLONG expected = (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+    const FILETIME time = DescriptorWriteTime(descriptor);
     if (FAILED(hr)) {
         error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
     } else if ((descriptor.dwFlags & FD_FILESIZE) && written != expected) {
         error = L"size differs from the descriptor: " + std::to_wstring(written) + L" of " + std::to_wstring(expected);
         hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
-    } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &descriptor.ftLastWriteTime)) {
+    } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &time)) {
         error = ErrorText(L"cannot set the write time", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
@@ -90,6 +91,14 @@ bool IsInside(const std::wstring& targetDir, const std::wstring& path) {
 }
 
 }  // namespace
+
+FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor) {
+    SYSTEMTIME local, universal;
+    FILETIME moment = descriptor.ftLastWriteTime;
+    if (FileTimeToSystemTime(&descriptor.ftLastWriteTime, &local) && TzSpecificLocalTimeToSystemTime(nullptr, &local, &universal))
+        SystemTimeToFileTime(&universal, &moment);
+    return moment;
+}
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
     FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_FILEDESCRIPTORW)), nullptr,

@@ -15,6 +15,11 @@ HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& fil
 // GetData directly: through a clipboard snapshot QueryGetData with an index fails.
 HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream);
 
+// The moment a descriptor's write time names. Our data object gives the device's own clock,
+// its local time, without a zone shift; read here as local time of that date (daylight saving
+// included), so that the file shows the time the receiver logged it.
+FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor);
+
 // Writes the stream's remaining bytes as target\name, the name made safe or refused by
 // MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the
 // size is checked against the descriptor and the write time set, then it is renamed. Nothing
