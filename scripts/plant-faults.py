@@ -222,12 +222,11 @@ def main():
         started = time.time()
         results[row["id"]] = planter.plant(row)
         print(f"{row['id']}: {results[row['id']][0]} ({time.time() - started:.0f} s)", flush=True)
+        if args.report:  # kept up to date, so that a run cut short still has its table
+            with open(args.report, "w", encoding="utf-8") as out:
+                out.write(report([r for r in rows if r["id"] in results], results) + "\n")
     planter.build_targets({"all"})  # leaves the copy built as it is
-    text = report(rows, results)
-    print(text)
-    if args.report:
-        with open(args.report, "w", encoding="utf-8") as out:
-            out.write(text + "\n")
+    print(report(rows, results))
 
 
 if __name__ == "__main__":
