@@ -143,6 +143,9 @@ class Planter:
             time.sleep(2)
         failed = re.findall(r"^\s*\d+ - (\S+) \((.*)\)$", output, re.M)
         cases = sorted(set(re.findall(r"^\[  FAILED  \] (\w+\.\w+)", output, re.M)))
+        if re.search(r"^FATAL: exception 0x", output, re.M):
+            cases.append("a crash")
+        cases += [f"{name}: {status.lower()}" for name, status in failed if status != "Failed"]
         ran = re.search(r"tests passed, (\d+) tests failed out of (\d+)", output)
         return [name for name, _ in failed if name != "wine_prefix"], cases, ran is not None
 
