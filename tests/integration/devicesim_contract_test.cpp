@@ -169,6 +169,7 @@ TEST(DeviceSimContractTest, ConfiguredFaultsAndDownloadsGiveTheirResults) {
         {"plain get_Model (global)", [&] { return plain->get_Model(text.Put()); }, E_NOTIMPL},
         {"get_Item of LOG0001", [&] { FileAt(files.Get(), 0, &hr); return hr; }, S_OK},
         {"get_Item of LOG0002", [&] { FileAt(files.Get(), 1, &hr); return hr; }, E_UNEXPECTED},
+        {"get_Item past the last file", [&] { FileAt(files.Get(), 2, &hr); return hr; }, E_INVALIDARG},
         {"Delete", [&] { return FileByName(files.Get(), L"LOG0001")->Delete(); }, E_ACCESSDENIED},
     };
     for (const auto& c : cases) EXPECT_EQ(c.expected, c.make()) << c.call;
