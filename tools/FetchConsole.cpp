@@ -54,12 +54,14 @@ void FetchConsole::Line(const std::wstring& text) {
     std::lock_guard<std::mutex> hold(m_lock);
     EndProgress();
     Write((m_stamped ? TimeStamp() : std::wstring()) + text + L"\n");
+    m_log.Write(TimeStamp() + text);
 }
 
 void FetchConsole::Error(const std::wstring& text) {
     std::lock_guard<std::mutex> hold(m_lock);
     EndProgress();
     WriteUtf8(stderr, L"calvex-fetch: " + text + L"\n");
+    m_log.Write(TimeStamp() + L"calvex-fetch: " + text);
 }
 
 void FetchConsole::Progress(const std::wstring& name, ULONGLONG done, ULONGLONG total, double seconds) {

@@ -24,8 +24,8 @@ public:
     ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
                   const std::atomic<bool>& interrupted, HANDLE stop);
 
-    // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start or
-    // the device manager went away (the reason on stderr).
+    // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start
+    // (the reason on stderr). A device manager that goes away is waited for.
     int Run();
 
 private:
@@ -38,6 +38,9 @@ private:
     };
 
     bool Start();
+    HRESULT BindBrands();
+    void Reconnect();
+    void Pause(ULONGLONG milliseconds);
     void OnChange(PCIDLIST_ABSOLUTE item);
     bool AnyDirty() const;
     void ProcessDirty();
