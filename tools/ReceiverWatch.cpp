@@ -227,9 +227,12 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     Watched& watched = found->second;
     watched.dirty = false;
     FetchTotals pass;
+    const std::set<std::wstring> givenUpBefore = watched.givenUp;
     ReceiverFetcher fetcher(m_options, m_console, pass, m_interrupted);
     fetcher.Watching(watched.folder, &watched.givenUp);
     fetcher.Run(watched.files.Get(), m_target + L"\\" + watched.folder);
+    if (pass.fetched) watched.reopened = false;
+    const bool reopen = pass.failed && !watched.reopened;
     if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
         // Cut by the unplug or by the device manager going away: what is missing is fetched
         // when the receiver is back (all receivers are dropped while the device manager is away).
@@ -238,12 +241,28 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
             m_watched.erase(found);
         }
         pass.failed = 0;
+    } else if (reopen && Reopen(watched)) {
+        // Unplugged and plugged back between two looks, the folder would still hold the
+        // receiver's old object, whose downloads all fail: with a new one, the file once more.
+        watched.givenUp = givenUpBefore;
+        pass.failed = 0;
     } else if (pass.failed) {
         watched.dirty = true;  // the run stopped at the failure: on with the other files
     }
     m_totals.fetched += pass.fetched;
     m_totals.failed += pass.failed;
     m_totals.bytes += pass.bytes;
+}
+
+bool ReceiverWatch::Reopen(Watched& watched) {
+    ComPtr<IShellFolder> files;
+    if (FAILED(watched.receiver.parent->BindToObject(watched.receiver.item.get(), nullptr, IID_IShellFolder,
+                                                     files.PutVoid())))
+        return false;
+    m_console.Line(watched.receiver.Title() + L" opened anew after the failure");
+    watched.files = std::move(files);
+    watched.reopened = watched.dirty = true;
+    return true;
 }
 
 bool ReceiverWatch::IsListed(const Watched& watched, int brand) {

@@ -94,6 +94,7 @@ TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
     struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; } steps[] = {
         {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\"", kExtensionAndSimulator, L"C:\\Survey data", false},
         {"install again", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\"", kExtensionAndSimulator, L"C:\\Survey data", false},
+        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
         {"uninstall", L"/x", kNothing, nullptr, false},
         {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product
         {"install the default features", L"/i", kExtension, nullptr, false},
