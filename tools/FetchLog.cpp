@@ -10,16 +10,16 @@ UniqueFile OpenForAppend(const std::wstring& path) {
     return UniqueFile(CreateFileW(path.c_str(), FILE_APPEND_DATA, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
                                   nullptr, OPEN_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr));
 }
+}  // namespace
 
-// Lines carry the time of day only, as on the console: the date is said once a day.
-std::wstring DateLine() {
+std::wstring LocalTimeText(bool date) {
     SYSTEMTIME now;
     GetLocalTime(&now);
-    wchar_t text[40];
-    swprintf(text, 40, L"---- %04u-%02u-%02u ----\r\n", now.wYear, now.wMonth, now.wDay);
+    wchar_t text[16];
+    if (date) swprintf(text, 16, L"%04u-%02u-%02u", now.wYear, now.wMonth, now.wDay);
+    else swprintf(text, 16, L"%02u:%02u:%02u ", now.wHour, now.wMinute, now.wSecond);
     return text;
 }
-}  // namespace
 
 void FetchLog::Write(const std::wstring& line) {
     if (m_path.empty()) return;
@@ -34,7 +34,9 @@ void FetchLog::Write(const std::wstring& line) {
     if (!file) return;
     SYSTEMTIME now;
     GetLocalTime(&now);
-    const std::string bytes = Utf8((m_day != now.wDay ? DateLine() : std::wstring()) + line + L"\r\n");
+    // Lines carry the time of day only, as on the console: the date is said once a day.
+    const std::wstring date = m_day != now.wDay ? L"---- " + LocalTimeText(true) + L" ----\r\n" : L"";
+    const std::string bytes = Utf8(date + line + L"\r\n");
     m_day = now.wDay;
     DWORD written = 0;
     WriteFile(file.Get(), bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr);

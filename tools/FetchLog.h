@@ -8,6 +8,9 @@
 
 constexpr ULONGLONG kLogLimit = 1024 * 1024;
 
+// The local time as every line starts with it, "15:05:11 ", or with date the day, "2026-11-24".
+std::wstring LocalTimeText(bool date = false);
+
 class FetchLog {
 public:
     void Open(const std::wstring& path) { m_path = path; }

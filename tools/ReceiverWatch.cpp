@@ -226,13 +226,13 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     if (found == m_watched.end()) return;
     Watched& watched = found->second;
     watched.dirty = false;
+    Reopen(watched);
     FetchTotals pass;
     const std::set<std::wstring> givenUpBefore = watched.givenUp;
     ReceiverFetcher fetcher(m_options, m_console, pass, m_interrupted);
     fetcher.Watching(watched.folder, &watched.givenUp);
     fetcher.Run(watched.files.Get(), m_target + L"\\" + watched.folder);
-    if (pass.fetched) watched.reopened = false;
-    const bool reopen = pass.failed && !watched.reopened;
+    if (pass.fetched) watched.retried = false;
     if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
         // Cut by the unplug or by the device manager going away: what is missing is fetched
         // when the receiver is back (all receivers are dropped while the device manager is away).
@@ -241,10 +241,11 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
             m_watched.erase(found);
         }
         pass.failed = 0;
-    } else if (reopen && Reopen(watched)) {
-        // Unplugged and plugged back between two looks, the folder would still hold the
-        // receiver's old object, whose downloads all fail: with a new one, the file once more.
+    } else if (pass.failed && !watched.retried) {
+        // Perhaps unplugged and plugged back during the pass: once more before giving files up.
+        m_console.Line(watched.receiver.Title() + L": trying once more");
         watched.givenUp = givenUpBefore;
+        watched.retried = watched.dirty = true;
         pass.failed = 0;
     } else if (pass.failed) {
         watched.dirty = true;  // the run stopped at the failure: on with the other files
@@ -254,15 +255,14 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     m_totals.bytes += pass.bytes;
 }
 
-bool ReceiverWatch::Reopen(Watched& watched) {
+// A receiver unplugged and plugged back between two looks is a new object of the device
+// manager: a folder bound before would still hold the old one, whose downloads all fail. So
+// every pass binds anew (a few calls); the folder then follows the receiver's file events.
+void ReceiverWatch::Reopen(Watched& watched) {
     ComPtr<IShellFolder> files;
-    if (FAILED(watched.receiver.parent->BindToObject(watched.receiver.item.get(), nullptr, IID_IShellFolder,
-                                                     files.PutVoid())))
-        return false;
-    m_console.Line(watched.receiver.Title() + L" opened anew after the failure");
-    watched.files = std::move(files);
-    watched.reopened = watched.dirty = true;
-    return true;
+    if (SUCCEEDED(watched.receiver.parent->BindToObject(watched.receiver.item.get(), nullptr, IID_IShellFolder,
+                                                        files.PutVoid())))
+        watched.files = std::move(files);
 }
 
 bool ReceiverWatch::IsListed(const Watched& watched, int brand) {

@@ -35,7 +35,7 @@ private:
         std::wstring folder;  // below the target
         bool dirty = true;
         std::set<std::wstring> givenUp;  // failed while plugged in this time
-        bool reopened = false;  // opened anew after a failure, and nothing fetched since
+        bool retried = false;  // tried again after a failure, and nothing fetched since
     };
 
     bool Start();
@@ -49,7 +49,7 @@ private:
     void Add(Receiver receiver, int brand);
     void FetchNew(const std::wstring& id);
     bool IsListed(const Watched& watched, int brand);
-    bool Reopen(Watched& watched);
+    void Reopen(Watched& watched);
     bool DeviceManagerGone();
     void WaitForWork(DWORD milliseconds);
     std::wstring Summary() const;
