@@ -51,7 +51,12 @@ int ReceiverWatch::Run() {
         }
         if (now >= nextRescan) {
             for (int brand = 0; brand < 2; ++brand) m_brandDirty[brand] = static_cast<bool>(m_brands[brand]);
-            for (auto& entry : m_watched) entry.second.dirty = true;
+            // Files given up are tried again too: a receiver unplugged and plugged back between
+            // two looks is not seen to go, and its failed files would wait for the next start.
+            for (auto& entry : m_watched) {
+                entry.second.dirty = true;
+                entry.second.givenUp.clear();
+            }
             nextRescan = now + kRescanMs;
         }
         if (!AnyDirty() && !m_gone) WaitForWork(static_cast<DWORD>((nextProbe < nextRescan ? nextProbe : nextRescan) - now));
