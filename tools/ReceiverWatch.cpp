@@ -231,6 +231,9 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     if (found == m_watched.end()) return;
     Watched& watched = found->second;
     watched.dirty = false;
+    // No folder name or not opened when it came: left alone until plugged in again (its files
+    // must never land in the target itself).
+    if (watched.folder.empty()) return;
     Reopen(watched);
     FetchTotals pass;
     const std::set<std::wstring> givenUpBefore = watched.givenUp;
