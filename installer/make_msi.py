@@ -15,7 +15,7 @@ import sys
 
 # Action types as wixl writes an executable installed with the product, and what an entry of
 # a DLL installed with the product is (the flags above the low six bits are kept).
-EXE_FILE, DLL_FILE, SOURCE_TYPE_BITS = 18, 17, 0x3F
+EXE_FILE, DLL_FILE, SET_PROPERTY, SOURCE_TYPE_BITS = 18, 17, 51, 0x3F
 IN_SCRIPT, ROLLBACK = 0x400, 0x100
 DLL_ACTIONS = ("RegisterShellExtension", "UnregisterShellExtension", "RollBackShellExtension")
 # wixl 0.101 writes Execute="rollback" without its in-script bits, which would make an
@@ -77,20 +77,21 @@ def xml(text):
     return text.replace("&", "&amp;").replace('"', "&quot;").replace("<", "&lt;").replace(">", "&gt;")
 
 
-def stage(work, dll, sim, fetch, samples):
+def stage(work, dll, sim, fetch, fetchw, samples):
     """wixl reads sources by relative path: link the inputs into one directory."""
     if os.path.isdir(work):
         shutil.rmtree(work)
     os.makedirs(work)
     inputs = (("CalvexReceiversShellExt.dll", dll), ("CalvexDeviceSim.exe", sim), ("calvex-fetch.exe", fetch),
-              ("samples", samples))
+              ("calvex-fetchw.exe", fetchw), ("samples", samples))
     for name, target in inputs:
         os.symlink(os.path.abspath(target), os.path.join(work, name))
 
 
 def fix_actions(msi):
     """Turns the module's actions into calls of the DLL's entries and makes rollback actions
-    roll back; every action must end up in the install script (deferred)."""
+    roll back; every action that changes the system must end up in the install script
+    (deferred). Setting a property (a default) happens at once."""
     table = subprocess.run(["msiinfo", "export", msi, "CustomAction"], check=True,
                            capture_output=True, text=True).stdout.splitlines()
     for row in table[3:]:
@@ -102,7 +103,7 @@ def fix_actions(msi):
             kind = (kind & ~SOURCE_TYPE_BITS) | DLL_FILE
         if action in ROLLBACK_ACTIONS:
             kind |= IN_SCRIPT | ROLLBACK
-        if not kind & IN_SCRIPT:
+        if not kind & IN_SCRIPT and kind & SOURCE_TYPE_BITS != SET_PROPERTY:
             sys.exit(f"{action}: not a deferred action ({kind})")
         if kind != int(written):
             subprocess.run(["msibuild", msi, "-q",
@@ -111,11 +112,11 @@ def fix_actions(msi):
 
 def main():
     p = argparse.ArgumentParser()
-    for a in ("wxs", "dll", "sim", "fetch", "samples", "work", "out"):
+    for a in ("wxs", "dll", "sim", "fetch", "fetchw", "samples", "work", "out"):
         p.add_argument("--" + a, required=True)
     args = p.parse_args()
     version = file_version(args.dll)
-    stage(args.work, args.dll, args.sim, args.fetch, args.samples)
+    stage(args.work, args.dll, args.sim, args.fetch, args.fetchw, args.samples)
     with open(os.path.join(args.work, "samples.wxs"), "w", encoding="utf-8") as f:
         f.write(sample_fragment(args.samples))
     shutil.copy(args.wxs, os.path.join(args.work, "product.wxs"))

@@ -10,3 +10,27 @@ waitfor() {  # waitfor FILE TEXT SECONDS: until FILE holds TEXT; a failure when 
   for _ in $(seq 1 $(($3 * 10))); do grep -qF -- "$2" "$1" 2>/dev/null && return 0; sleep 0.1; done
   bad "no \"$2\" in $(basename "$1") within $3 s"; return 1
 }
+
+# The watch tests' receivers: they use $prefix (the Wine prefix), $root (the simulator's tree),
+# $work (scratch space) and $stamp (the last file time given, in seconds since 1970).
+ends() {  # ends PID SECONDS: its exit code; killed when it runs longer
+  for _ in $(seq 1 $(($2 * 10))); do kill -0 $1 2>/dev/null || break; sleep 0.1; done
+  kill -0 $1 2>/dev/null && { bad "still running $2 s on"; kill -9 $1; }
+  wait $1
+}
+simlog() { cat "$prefix"/drive_c/users/*/Temp/CalvexDeviceSim.log 2>/dev/null | grep -F "$(win "$root")"; }
+downloading() {  # downloading RECEIVER FILE: until the simulator has started sending it
+  for _ in $(seq 1 300); do simlog | grep -qF "$(win "$root/$1/$2")\" started" && return 0; sleep 0.1; done
+  bad "the download of $1/$2 never started"; return 1
+}
+receiver() {  # receiver DIR BRAND SERIAL MODEL: 40,000 bytes a second
+  mkdir -p "$1"
+  printf '[Receiver]\r\nBrand=%s\r\nLabel=Test\r\nSerialNumber=%s\r\nModel=%s\r\nPortType=2\r\n[Transfer]\r\nRate=40000\r\n' \
+    "$2" "$3" "$4" >"$1/receiver.ini"
+}
+log() {  # log DIR NAME BYTES: a file the receiver logs, with a time of its own, there at once
+  stamp=$((stamp + 61))
+  head -c "$3" /dev/urandom >"$work/$2.new"
+  touch -d "@$stamp" "$work/$2.new"
+  mv "$work/$2.new" "$1/$2"
+}

@@ -1,6 +1,7 @@
-// Guards the MSI: keys registration misses or leaves behind, files left after removal, a version that is not the DLL's, a repeated install or removal that breaks the first.
+// Guards the MSI: keys registration misses or leaves behind, files left after removal, a version that is not the DLL's, a repeated install or removal that breaks the first, a logon start of the automatic download that points elsewhere or outlives the product.
 #include <windows.h>
 #include <msi.h>
+#include <shlobj.h>
 
 #include <cstdlib>
 #include <string>
@@ -18,6 +19,7 @@ namespace {
 const wchar_t kUpgradeCode[] = L"{3F4C8E0B-61D2-4B5A-9C3E-7A0D2E5B9C41}";
 const wchar_t kDeviceMgr[] = L"CLSID\\{0FADF314-B4FD-413C-9E26-6BC49B066080}\\LocalServer32";
 const wchar_t kSimSettings[] = L"Software\\Calvex\\DeviceSim";
+const wchar_t kRun[] = L"Software\\Microsoft\\Windows\\CurrentVersion\\Run";
 
 std::wstring InstallDir() { return std::wstring(_wgetenv(L"ProgramFiles")) + L"\\Calvex\\Receivers Shell Extension"; }
 
@@ -54,7 +56,18 @@ void ExpectSamplesInstalled() {
 
 enum State { kNothing, kExtension, kExtensionAndSimulator };
 
-void ExpectState(State state) {
+// What the logon start of the automatic download runs, for the folder the install was given.
+std::wstring RunCommand(const wchar_t* fetchDir) {
+    if (!fetchDir) return L"<none>";
+    wchar_t documents[MAX_PATH] = L"";
+    SHGetFolderPathW(nullptr, CSIDL_PERSONAL, nullptr, SHGFP_TYPE_CURRENT, documents);
+    const std::wstring folder = *fetchDir ? fetchDir : std::wstring(documents) + L"\\Survey";
+    return L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --watch \"" + folder + L"\"";
+}
+
+void ExpectState(State state, const wchar_t* fetchDir) {
+    EXPECT_EQ(RunCommand(fetchDir), RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
+    EXPECT_EQ(state != kNothing, FileExists(InstallDir() + L"\\calvex-fetchw.exe"));
     const std::wstring dll = InstallDir() + L"\\CalvexReceiversShellExt.dll";
     const std::wstring sim = InstallDir() + L"\\CalvexDeviceSim.exe";
     EXPECT_EQ(state != kNothing, FileExists(dll));
@@ -75,15 +88,19 @@ void ExpectState(State state) {
 }
 }  // namespace
 
-TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndTheOptionalSimulator) {
-    ExpectState(kNothing);
-    struct Step { const char* what; const wchar_t* arguments; State after; bool mayBeUnknown; } steps[] = {
-        {"install with the simulator", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, false},
-        {"install again", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, false},
-        {"uninstall", L"/x", kNothing, false},
-        {"uninstall again", L"/x", kNothing, true},  // Windows answers an unknown product
-        {"install the default features", L"/i", kExtension, false},
-        {"uninstall", L"/x", kNothing, false},
+TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
+    ExpectState(kNothing, nullptr);
+    // fetchDir: the folder the logon start watches ("" the default), null when there is none.
+    struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; } steps[] = {
+        {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\"", kExtensionAndSimulator, L"C:\\Survey data", false},
+        {"install again", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\"", kExtensionAndSimulator, L"C:\\Survey data", false},
+        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
+        {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product
+        {"install the default features", L"/i", kExtension, nullptr, false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
+        {"install the automatic download alone", L"/i ADDLOCAL=AutoFetch", kExtension, L"", false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
     };
     const std::wstring msi = L" \"" + BuildDir() + L"\\CalvexReceiversShellExt.msi\" /qn";
     for (const Step& step : steps) {
@@ -91,6 +108,6 @@ TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndTheOptionalSimulator) {
         const std::wstring arguments = step.arguments;  // the action, then properties after the package
         const DWORD exitCode = RunProcess(L"msiexec.exe " + arguments.substr(0, 2) + msi + arguments.substr(2), 300000);
         EXPECT_TRUE(exitCode == 0 || (step.mayBeUnknown && exitCode == ERROR_UNKNOWN_PRODUCT)) << exitCode;
-        ExpectState(step.after);
+        ExpectState(step.after, step.fetchDir);
     }
 }

@@ -12,14 +12,6 @@ bool IsConsole(HANDLE handle) {
     return GetFileType(handle) == FILE_TYPE_CHAR && GetConsoleMode(handle, &mode);
 }
 
-std::wstring TimeStamp() {
-    SYSTEMTIME now;
-    GetLocalTime(&now);
-    wchar_t text[16];
-    swprintf(text, 16, L"%02u:%02u:%02u ", now.wHour, now.wMinute, now.wSecond);
-    return text;
-}
-
 std::wstring Format(const wchar_t* format, double value) {
     wchar_t text[64];
     swprintf(text, 64, format, value);
@@ -53,13 +45,15 @@ void FetchConsole::EndProgress() {
 void FetchConsole::Line(const std::wstring& text) {
     std::lock_guard<std::mutex> hold(m_lock);
     EndProgress();
-    Write((m_stamped ? TimeStamp() : std::wstring()) + text + L"\n");
+    Write((m_stamped ? LocalTimeText() : std::wstring()) + text + L"\n");
+    m_log.Write(LocalTimeText() + text);
 }
 
 void FetchConsole::Error(const std::wstring& text) {
     std::lock_guard<std::mutex> hold(m_lock);
     EndProgress();
     WriteUtf8(stderr, L"calvex-fetch: " + text + L"\n");
+    m_log.Write(LocalTimeText() + L"calvex-fetch: " + text);
 }
 
 void FetchConsole::Progress(const std::wstring& name, ULONGLONG done, ULONGLONG total, double seconds) {

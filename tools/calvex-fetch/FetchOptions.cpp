@@ -2,8 +2,8 @@
 
 const wchar_t kFetchUsage[] =
     L"usage: calvex-fetch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--all | --new] "
-    L"[--dry-run] TARGET\n"
-    L"       calvex-fetch --watch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... TARGET\n";
+    L"[--dry-run] [--log FILE] TARGET\n"
+    L"       calvex-fetch --watch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--log FILE] TARGET\n";
 
 namespace {
 bool Fail(std::wstring& error, const std::wstring& reason) {
@@ -25,10 +25,11 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::wstring& argument = arguments[i];
         const bool hasValue = i + 1 < arguments.size();
-        if (argument == L"--brand" || argument == L"--receiver") {
+        if (argument == L"--brand" || argument == L"--receiver" || argument == L"--log") {
             if (!hasValue) return Fail(error, argument + L" needs a value");
             const std::wstring& value = arguments[++i];
             if (argument == L"--receiver") options.receivers.push_back(value);
+            else if (argument == L"--log") options.log = value;
             else if (!SetBrand(value, options)) return Fail(error, L"unknown brand \"" + value + L"\"");
         } else if (argument == L"--all") {
             options.all = true;
@@ -44,6 +45,8 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
             return Fail(error, L"more than one TARGET");
         } else {
             options.target = argument;
+            // "D:\Survey\" on a command line arrives as D:\Survey" (the backslash escapes the quote).
+            if (options.target.size() > 1 && options.target.back() == L'"') options.target.pop_back();
         }
     }
     if (options.all && newOnly) return Fail(error, L"--all and --new exclude each other");

@@ -10,6 +10,7 @@ struct FetchOptions {
     bool all = false;      // fetch again what is already there
     bool dryRun = false;
     bool watch = false;    // keep running and fetch what receivers bring, as it comes
+    std::wstring log;      // the log file; empty: none (the windowless build has a default)
     std::wstring target;   // as given; made absolute by the caller
 };
 

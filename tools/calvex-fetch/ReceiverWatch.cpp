@@ -10,6 +10,10 @@ namespace {
 // dialog asks as often), and how often everything is compared in case a notification was lost.
 constexpr ULONGLONG kLivenessMs = 2000;
 constexpr ULONGLONG kRescanMs = 60000;
+// Pauses before each new try while the device manager is away: soon after a restart, then
+// once a minute for as long as it takes.
+constexpr ULONGLONG kRetrySeconds[] = {2, 4, 8, 16, 30, 60};
+constexpr size_t kRetrySteps = sizeof(kRetrySeconds) / sizeof(kRetrySeconds[0]);
 
 std::wstring WatchId(int brand, const std::wstring& key) { return std::to_wstring(brand) + L"|" + key; }
 int BrandOf(const std::wstring& id) { return id[0] - L'0'; }
@@ -32,7 +36,12 @@ int ReceiverWatch::Run() {
     if (!Start()) return 2;
     m_started = GetTickCount64();
     ULONGLONG nextProbe = m_started + kLivenessMs, nextRescan = m_started + kRescanMs;
-    while (!m_interrupted && !m_gone) {
+    while (!m_interrupted) {
+        if (m_gone) {
+            Reconnect();
+            nextRescan = GetTickCount64() + kRescanMs;
+            continue;
+        }
         while (AnyDirty() && !m_interrupted && !m_gone) ProcessDirty();
         m_plugging = true;
         const ULONGLONG now = GetTickCount64();
@@ -42,13 +51,17 @@ int ReceiverWatch::Run() {
         }
         if (now >= nextRescan) {
             for (int brand = 0; brand < 2; ++brand) m_brandDirty[brand] = static_cast<bool>(m_brands[brand]);
-            for (auto& entry : m_watched) entry.second.dirty = true;
+            // Files given up are tried again too: a receiver unplugged and plugged back between
+            // two looks is not seen to go, and its failed files would wait for the next start.
+            for (auto& entry : m_watched) {
+                entry.second.dirty = true;
+                entry.second.givenUp.clear();
+            }
             nextRescan = now + kRescanMs;
         }
-        if (!AnyDirty()) WaitForWork(static_cast<DWORD>((nextProbe < nextRescan ? nextProbe : nextRescan) - now));
+        if (!AnyDirty() && !m_gone) WaitForWork(static_cast<DWORD>((nextProbe < nextRescan ? nextProbe : nextRescan) - now));
     }
     m_console.Line(Summary());
-    if (m_gone) return 2;
     return m_totals.failed ? 1 : 0;
 }
 
@@ -58,20 +71,18 @@ bool ReceiverWatch::Start() {
         m_console.Error(L"no device manager: it cannot be started (" + HexText(hr) + L")");
         return false;
     }
-    const bool wanted[2] = {m_options.calvex, m_options.brennor};
     std::vector<PCIDLIST_ABSOLUTE> folders;
     std::wstring names;
-    for (int brand = 0; brand < 2; ++brand) {
-        if (!wanted[brand]) continue;
-        hr = BindShellPath(kBrandFolderPaths[brand], m_brands[brand]);
-        if (SUCCEEDED(hr)) hr = ParseShellPath(kBrandFolderPaths[brand], m_brandItems[brand]);
-        if (FAILED(hr)) {
-            m_console.Error(L"the receivers folders cannot be opened: is the extension registered?");
-            return false;
-        }
+    hr = BindBrands();
+    for (int brand = 0; brand < 2 && SUCCEEDED(hr); ++brand) {
+        if (!m_brands[brand]) continue;
+        hr = ParseShellPath(kBrandFolderPaths[brand], m_brandItems[brand]);
         folders.push_back(m_brandItems[brand].get());
         names += (names.empty() ? L"" : L" and ") + std::wstring(kBrandNames[brand]);
-        m_brandDirty[brand] = true;
+    }
+    if (FAILED(hr)) {
+        m_console.Error(L"the receivers folders cannot be opened: is the extension registered?");
+        return false;
     }
     hr = m_listener.Start(folders);
     if (FAILED(hr)) {
@@ -84,6 +95,50 @@ bool ReceiverWatch::Start() {
     m_console.Line(L"watching the " + names + L" receivers" + only + L", new files into " + m_target +
                    L" (Ctrl+C stops)");
     return true;
+}
+
+// A brand folder binds the device manager's collection once, on its first listing: after a
+// restart of the device manager only new folder objects see the new one.
+HRESULT ReceiverWatch::BindBrands() {
+    const bool wanted[2] = {m_options.calvex, m_options.brennor};
+    for (int brand = 0; brand < 2; ++brand) {
+        m_brands[brand].Reset();
+        if (!wanted[brand]) continue;
+        const HRESULT hr = BindShellPath(kBrandFolderPaths[brand], m_brands[brand]);
+        if (FAILED(hr)) return hr;
+        m_brandDirty[brand] = true;
+    }
+    return S_OK;
+}
+
+// Every receiver and folder of the old device manager is dropped; the new one is asked with a
+// growing pause, and once it answers every receiver is compared in full, as after a replug.
+void ReceiverWatch::Reconnect() {
+    m_watched.clear();
+    for (ComPtr<IShellFolder>& brand : m_brands) brand.Reset();
+    m_manager.Reset();
+    for (size_t attempt = 0; !m_interrupted; ++attempt) {
+        const ULONGLONG pause = kRetrySeconds[attempt < kRetrySteps ? attempt : kRetrySteps - 1];
+        m_console.Line(L"trying the device manager again in " + std::to_wstring(pause) + L" s");
+        Pause(pause * 1000);
+        if (m_interrupted) return;
+        HRESULT hr = ConnectDeviceManager(m_manager);
+        if (SUCCEEDED(hr)) hr = AskDeviceManager(m_manager.Get());
+        if (SUCCEEDED(hr)) hr = BindBrands();
+        if (SUCCEEDED(hr)) break;
+        m_manager.Reset();
+        m_console.Line(L"no device manager yet (" + HexText(hr) + L")");
+    }
+    if (m_interrupted) return;
+    m_gone = false;
+    m_plugging = false;
+    m_console.Line(L"the device manager is back: every receiver is compared in full");
+}
+
+void ReceiverWatch::Pause(ULONGLONG milliseconds) {
+    const ULONGLONG until = GetTickCount64() + milliseconds;
+    for (ULONGLONG now = GetTickCount64(); !m_interrupted && now < until; now = GetTickCount64())
+        WaitForWork(static_cast<DWORD>(until - now));
 }
 
 // From a message handler, possibly inside a download's modal loop: only marks what to look at.
@@ -176,14 +231,29 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     if (found == m_watched.end()) return;
     Watched& watched = found->second;
     watched.dirty = false;
+    // No folder name or not opened when it came: left alone until plugged in again (its files
+    // must never land in the target itself).
+    if (watched.folder.empty()) return;
+    Reopen(watched);
     FetchTotals pass;
+    const std::set<std::wstring> givenUpBefore = watched.givenUp;
     ReceiverFetcher fetcher(m_options, m_console, pass, m_interrupted);
     fetcher.Watching(watched.folder, &watched.givenUp);
     fetcher.Run(watched.files.Get(), m_target + L"\\" + watched.folder);
-    if (pass.failed && !m_gone && !IsListed(watched, BrandOf(id))) {
-        // Cut by the unplug: what is missing is fetched when the receiver is back.
-        m_console.Line(watched.receiver.Title() + L" unplugged; what it had not sent comes when it is back");
-        m_watched.erase(found);
+    if (pass.fetched) watched.retried = false;
+    if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
+        // Cut by the unplug or by the device manager going away: what is missing is fetched
+        // when the receiver is back (all receivers are dropped while the device manager is away).
+        if (!m_gone) {
+            m_console.Line(watched.receiver.Title() + L" unplugged; what it had not sent comes when it is back");
+            m_watched.erase(found);
+        }
+        pass.failed = 0;
+    } else if (pass.failed && !watched.retried) {
+        // Perhaps unplugged and plugged back during the pass: once more before giving files up.
+        m_console.Line(watched.receiver.Title() + L": trying once more");
+        watched.givenUp = givenUpBefore;
+        watched.retried = watched.dirty = true;
         pass.failed = 0;
     } else if (pass.failed) {
         watched.dirty = true;  // the run stopped at the failure: on with the other files
@@ -191,6 +261,16 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     m_totals.fetched += pass.fetched;
     m_totals.failed += pass.failed;
     m_totals.bytes += pass.bytes;
+}
+
+// A receiver unplugged and plugged back between two looks is a new object of the device
+// manager: a folder bound before would still hold the old one, whose downloads all fail. So
+// every pass binds anew (a few calls); the folder then follows the receiver's file events.
+void ReceiverWatch::Reopen(Watched& watched) {
+    ComPtr<IShellFolder> files;
+    if (SUCCEEDED(watched.receiver.parent->BindToObject(watched.receiver.item.get(), nullptr, IID_IShellFolder,
+                                                        files.PutVoid())))
+        watched.files = std::move(files);
 }
 
 bool ReceiverWatch::IsListed(const Watched& watched, int brand) {
@@ -205,7 +285,7 @@ bool ReceiverWatch::DeviceManagerGone() {
     const HRESULT hr = AskDeviceManager(m_manager.Get());
     if (!IsServerGone(hr)) return false;
     m_gone = true;
-    m_console.Error(L"the device manager is gone (" + HexText(hr) + L"): no receiver can be watched any more");
+    m_console.Line(L"the device manager is gone (" + HexText(hr) + L"): waiting for it to come back");
     return true;
 }
 

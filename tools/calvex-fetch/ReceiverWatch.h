@@ -24,8 +24,8 @@ public:
     ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
                   const std::atomic<bool>& interrupted, HANDLE stop);
 
-    // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start or
-    // the device manager went away (the reason on stderr).
+    // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start
+    // (the reason on stderr). A device manager that goes away is waited for.
     int Run();
 
 private:
@@ -35,9 +35,13 @@ private:
         std::wstring folder;  // below the target
         bool dirty = true;
         std::set<std::wstring> givenUp;  // failed while plugged in this time
+        bool retried = false;  // tried again after a failure, and nothing fetched since
     };
 
     bool Start();
+    HRESULT BindBrands();
+    void Reconnect();
+    void Pause(ULONGLONG milliseconds);
     void OnChange(PCIDLIST_ABSOLUTE item);
     bool AnyDirty() const;
     void ProcessDirty();
@@ -45,6 +49,7 @@ private:
     void Add(Receiver receiver, int brand);
     void FetchNew(const std::wstring& id);
     bool IsListed(const Watched& watched, int brand);
+    void Reopen(Watched& watched);
     bool DeviceManagerGone();
     void WaitForWork(DWORD milliseconds);
     std::wstring Summary() const;

@@ -2,8 +2,12 @@
 // namespace that the user browses (see the README for the options and an example run).
 //
 // Exit code: 0 all good, 1 some files failed, 2 nothing could be done (no device manager, no
-// such receiver, target not writable, bad arguments). With --watch (ReceiverWatch.h) it runs
-// until stopped: 0 or 1 as above, 2 also when the device manager goes away.
+// such receiver, target not writable, another calvex-fetch fetching into the target, bad
+// arguments). With --watch (ReceiverWatch.h) it runs until stopped, also through a restart of
+// the device manager: 0 or 1 as above.
+//
+// Built twice: calvex-fetch.exe for a console, calvex-fetchw.exe (CALVEX_WINDOWLESS) without
+// one, to be started at logon; that one logs to TARGET\calvex-fetch.log unless told otherwise.
 #include <windows.h>
 #include <ole2.h>
 
@@ -19,7 +23,9 @@
 #include "ReceiverFetcher.h"
 #include "ReceiverList.h"
 #include "ReceiverWatch.h"
+#include "SessionEndWindow.h"
 #include "ShellNamespace.h"
+#include "TargetLock.h"
 
 namespace {
 const wchar_t kNoReceiver[] = L"no receiver is connected";
@@ -29,14 +35,18 @@ HANDLE g_stop = nullptr;      // set when the user stops the tool
 HANDLE g_finished = nullptr;  // set once the summary is out
 
 // Ctrl+C cancels the running download through its dialog, as the user would; no file that
-// looks complete is left, and the summary is still printed. Closing the console ends the
-// process as soon as this returns, so that waits (briefly) until the tool has wound up.
-BOOL WINAPI OnConsoleControl(DWORD event) {
+// looks complete is left, and the summary is still printed. Closing the console, logging off
+// or shutting down ends the process as soon as the handler returns, so that waits (briefly)
+// until the tool has wound up.
+void Stop(bool windUp) {
     g_interrupted = true;
     DownloadDialogWatch::CancelRunningDialog();
     SetEvent(g_stop);
-    if (event == CTRL_CLOSE_EVENT || event == CTRL_LOGOFF_EVENT || event == CTRL_SHUTDOWN_EVENT)
-        WaitForSingleObject(g_finished, 4000);
+    if (windUp) WaitForSingleObject(g_finished, 4000);
+}
+
+BOOL WINAPI OnConsoleControl(DWORD event) {
+    Stop(event == CTRL_CLOSE_EVENT || event == CTRL_LOGOFF_EVENT || event == CTRL_SHUTDOWN_EVENT);
     return TRUE;
 }
 
@@ -111,8 +121,18 @@ std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULO
 
 int Fetch(const FetchOptions& options, FetchConsole& console) {
     const std::wstring target = FullPath(options.target);
+#ifdef CALVEX_WINDOWLESS
+    console.SetLog(options.log.empty() ? target + L"\\calvex-fetch.log" : FullPath(options.log));
+#else
+    if (!options.log.empty()) console.SetLog(FullPath(options.log));
+#endif
     if (!options.dryRun && !IsWritableFolder(target)) {
         console.Error(L"target not writable: " + target);
+        return 2;
+    }
+    TargetLock lock;  // a dry run writes nothing: it may look at a watched folder
+    if (!options.dryRun && !lock.Acquire(target)) {
+        console.Error(L"another calvex-fetch is fetching into " + target + L" already: one at a time per folder");
         return 2;
     }
     if (options.watch) {
@@ -166,14 +186,17 @@ int wmain(int argc, wchar_t** argv) {
     SetConsoleCtrlHandler(OnConsoleControl, TRUE);
     int result;
     {
+#ifdef CALVEX_WINDOWLESS
+        SessionEndWindow sessionEnd([] { Stop(true); });
+#endif
         MessageBoxAnswerer answerer([&](const std::wstring& title, const std::wstring& text) {
             std::wstring flat = text;
             for (wchar_t& c : flat) if (c == L'\r' || c == L'\n') c = L' ';
             console.Line(L"  message box: " + title + L": " + flat);
         });
         result = Fetch(options, console);
+        SetEvent(g_finished);
     }
-    SetEvent(g_finished);
     OleUninitialize();
     return result;
 }

@@ -1,0 +1,84 @@
+#!/usr/bin/env bash
+# fetch_watch_restart_check.sh BUILD_DIR: the windowless calvex-fetchw --watch, as started at
+# logon, through a restart of the device manager. Files logged while it is away come once it
+# is back; a second watch and a batch run into the same folder are refused while the first
+# runs on; the end of the session stops it during a download without leaving a partial file.
+# Guards against a watch that ends for good with the device manager, files fetched twice by
+# racing tools, a log without its lines, and a logoff that leaves half a file.
+set -u
+build=$1
+run="$build/wine-run"
+prefix=${CALVEX_WINEPREFIX:-$build/wineprefix}
+work=$(mktemp -d /tmp/calvex-restart-XXXXXX)
+root=$work/root target=$work/target wlog=$work/watch.log
+mkdir -p "$root" "$target"
+
+source "$(dirname "$0")/lib.sh"
+fail=0
+stamp=1795000000
+
+receiver "$root/Calvex A" 1 1000-0001 A
+log "$root/Calvex A" LOG0001 3000
+receiver "$root/Brennor C" 2 2000-0003 C
+log "$root/Brennor C" LOG0001 4000
+"$run" "$build/CalvexDeviceSim.exe" /Quit
+"$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$root")" /f >/dev/null 2>&1
+"$run" "$build/calvex-fetchw.exe" --watch --log "$(win "$wlog")" "$(win "$target")" >"$work/out.txt" 2>&1 &
+tool=$!
+waitfor "$wlog" "fetched     A@USB\\LOG0001" 60
+waitfor "$wlog" "fetched     C@USB\\LOG0001" 30
+
+# One at a time: a second watch (logging to the target's own calvex-fetch.log, the windowless
+# default) and a batch run into the same folder, spelt otherwise, are refused; the first runs on.
+refusal="calvex-fetch: another calvex-fetch is fetching into $(win "$target") already"
+"$run" "$build/calvex-fetchw.exe" --watch "$(win "$target")" >/dev/null 2>&1 &
+ends $! 30; status=$?
+[ $status -eq 2 ] || bad "a second watch ended with $status"
+grep -qE "^[0-9:]{8} $(printf '%s' "$refusal" | sed 's/[\\.]/\\&/g')" "$target/calvex-fetch.log" ||
+  bad "the second watch's log: $(cat "$target/calvex-fetch.log")"
+"$run" "$build/calvex-fetch.exe" "$(win "$target")\\" >/dev/null 2>"$work/batch.err"; status=$?
+[ $status -eq 2 ] || bad "a batch run into the watched folder ended with $status"
+grep -qF "$refusal" "$work/batch.err" || bad "the batch run's stderr: $(cat "$work/batch.err")"
+kill -0 $tool 2>/dev/null || bad "the first watch did not run on"
+rm -f "$target/calvex-fetch.log"
+
+# The device manager quits (a service restart); files logged meanwhile come once it is back.
+"$run" "$build/CalvexDeviceSim.exe" /Quit
+waitfor "$wlog" "the device manager is gone (0x" 15
+log "$root/Calvex A" LOG0002 5000
+log "$root/Brennor C" LOG0002 6000
+waitfor "$wlog" "the device manager is back: every receiver is compared in full" 40
+waitfor "$wlog" "fetched     A@USB\\LOG0002" 30
+waitfor "$wlog" "fetched     C@USB\\LOG0002" 30
+
+# The session ends while a file downloads: discarded, a summary, the process gone.
+log "$root/Calvex A" BIG0001 200000
+downloading "Calvex A" BIG0001 && sleep 1
+"$run" wineboot --end-session
+ends $tool 20; status=$?
+[ $status -eq 0 ] || bad "exit code $status at the end of the session"
+waitfor "$wlog" "discarded   A@USB\\BIG0001.qpr (stopped)" 1
+grep -q "^[0-9:]* watch ended: .* (stopped)$" <(tr -d '\r' <"$wlog") || bad "no summary"
+grep -vE '^(---- [0-9-]+ ----)?$' <(tr -d '\r' <"$wlog") | grep -qvE '^[0-2][0-9]:[0-5][0-9]:[0-5][0-9] ' &&
+  bad "a log line without its time"
+"$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Root /f >/dev/null 2>&1
+tr -d '\r' <"$wlog"
+
+# Every file but the one cut off, once, whole, with its time; nothing partial.
+rm "$root/Calvex A/BIG0001"
+expected=0
+for file in "$root"/*/*; do
+  name=$(basename "$file") dir=$(basename "$(dirname "$file")")
+  [ "$name" = receiver.ini ] && continue
+  expected=$((expected + 1))
+  got=$(ls "$target/${dir#* }@USB/$name"* 2>/dev/null | head -1)
+  if [ -z "$got" ]; then bad "$dir/$name was not fetched"; continue; fi
+  cmp -s "$file" "$got" || bad "$dir/$name differs"
+  [ "$(stat -c %Y "$file")" = "$(stat -c %Y "$got")" ] || bad "$dir/$name has not the device's time"
+  count=$(grep -cE "  fetched     ${dir#* }@USB\\\\$name(\.qpr)?  " "$wlog")
+  [ "$count" = 1 ] || bad "$dir/$name fetched $count times"
+done
+[ "$(find "$target" -type f | wc -l)" = $expected ] || bad "other files were left: $(find "$target" -type f)"
+rm -rf "$work"
+[ $fail -eq 0 ] && echo "PASS: through a restart of the device manager, one watch per folder, a clean end of session"
+exit $fail

@@ -1,0 +1,26 @@
+#include "TargetLock.h"
+
+#include <cstdio>
+
+std::wstring TargetLockName(const std::wstring& target) {
+    wchar_t longPath[MAX_PATH];
+    const DWORD length = GetLongPathNameW(target.c_str(), longPath, MAX_PATH);
+    std::wstring path = length && length < MAX_PATH ? longPath : target;
+    while (path.size() > 3 && (path.back() == L'\\' || path.back() == L'/')) path.pop_back();
+    CharUpperBuffW(&path[0], static_cast<DWORD>(path.size()));
+    unsigned long long hash = 14695981039346656037ull;  // FNV-1a over the UTF-16 units
+    for (wchar_t c : path) {
+        if (c == L'/') c = L'\\';
+        hash = (hash ^ static_cast<unsigned>(c)) * 1099511628211ull;
+    }
+    wchar_t name[48];
+    swprintf(name, 48, L"Local\\calvex-fetch-%016llX", hash);
+    return name;
+}
+
+bool TargetLock::Acquire(const std::wstring& target) {
+    m_mutex.Reset(CreateMutexW(nullptr, TRUE, TargetLockName(target).c_str()));
+    if (m_mutex && GetLastError() != ERROR_ALREADY_EXISTS) return true;
+    m_mutex.Reset();
+    return false;
+}
