@@ -66,19 +66,7 @@ tr -d '\r' <"$wlog"
 
 # Every file but the one cut off, once, whole, with its time; nothing partial.
 rm "$root/Calvex A/BIG0001"
-expected=0
-for file in "$root"/*/*; do
-  name=$(basename "$file") dir=$(basename "$(dirname "$file")")
-  [ "$name" = receiver.ini ] && continue
-  expected=$((expected + 1))
-  got=$(ls "$target/${dir#* }@USB/$name"* 2>/dev/null | head -1)
-  if [ -z "$got" ]; then bad "$dir/$name was not fetched"; continue; fi
-  cmp -s "$file" "$got" || bad "$dir/$name differs"
-  [ "$(stat -c %Y "$file")" = "$(stat -c %Y "$got")" ] || bad "$dir/$name has not the device's time"
-  count=$(grep -cE "  fetched     ${dir#* }@USB\\\\$name(\.qpr)?  " "$wlog")
-  [ "$count" = 1 ] || bad "$dir/$name fetched $count times"
-done
-[ "$(find "$target" -type f | wc -l)" = $expected ] || bad "other files were left: $(find "$target" -type f)"
+landed "$wlog"
 rm -rf "$work"
 [ $fail -eq 0 ] && echo "PASS: through a restart of the device manager, one watch per folder, a clean end of session"
 exit $fail

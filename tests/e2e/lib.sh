@@ -34,3 +34,20 @@ log() {  # log DIR NAME BYTES: a file the receiver logs, with a time of its own,
   touch -d "@$stamp" "$work/$2.new"
   mv "$work/$2.new" "$1/$2"
 }
+landed() {  # landed LOG [DIR/NAME...]: every file of $root in $target once (the named ones twice
+  # by LOG's lines), whole, with the device's time, and nothing else in $target
+  local log=$1 expected=0 file name dir got count want twice; shift
+  for file in "$root"/*/*; do
+    name=$(basename "$file") dir=$(basename "$(dirname "$file")")
+    [ "$name" = receiver.ini ] && continue
+    expected=$((expected + 1))
+    got=$(ls "$target/${dir#* }@USB/$name"* 2>/dev/null | head -1)
+    if [ -z "$got" ]; then bad "$dir/$name was not fetched"; continue; fi
+    cmp -s "$file" "$got" || bad "$dir/$name differs"
+    [ "$(stat -c %Y "$file")" = "$(stat -c %Y "$got")" ] || bad "$dir/$name has not the device's time"
+    count=$(grep -cE "  fetched     ${dir#* }@USB\\\\$name(\.qpr)?  " "$log") want=1
+    for twice in "$@"; do [ "$dir/$name" = "$twice" ] && want=2; done
+    [ "$count" = $want ] || bad "$dir/$name fetched $count times"
+  done
+  [ "$(find "$target" -type f | wc -l)" = $expected ] || bad "other files were left: $(find "$target" -type f)"
+}
