@@ -26,6 +26,13 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
 DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000, std::string* out = nullptr,
                  std::string* err = nullptr);
 
+// A dialog control's text.
+std::wstring ChildText(HWND parent, int id);
+// Runs action on this thread while another thread reads and closes every dialog titled
+// title that it opens (a message box or the properties sheet); returns what was read.
+std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
+                                            const std::function<std::wstring(HWND)>& read);
+
 // A file's bytes, also while another holds it open for writing; empty when it cannot be read.
 std::string ReadFileBytes(const std::wstring& path);
 
