@@ -15,7 +15,6 @@ std::wstring BuildDir();
 std::wstring SourceDir();
 std::wstring ModuleDllPath();  // the built CalvexReceiversShellExt.dll
 
-// Dispatches this thread's messages for the given time.
 void PumpMessagesFor(DWORD milliseconds);
 // Dispatches messages until done() or the timeout; returns done()'s last answer.
 bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
