@@ -39,17 +39,13 @@ std::vector<std::wstring> InstalledVersions() {
 // Every sample file whose name the installer can carry (ASCII) is installed with its bytes.
 void ExpectSamplesInstalled() {
     const std::wstring source = SourceDir() + L"\\sample-receivers\\", target = InstallDir() + L"\\sample-receivers\\";
-    WIN32_FIND_DATAW found;
     int compared = 0;
     for (const wchar_t* receiver : {L"Calvex Q9 USB", L"Brennor R2 COM4", L"Calvex lab unknown port"}) {
-        HANDLE files = FindFirstFileW((source + receiver + L"\\*").c_str(), &found);
-        for (BOOL more = files != INVALID_HANDLE_VALUE; more; more = FindNextFileW(files, &found)) {
-            if (found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) continue;
-            const std::wstring name = std::wstring(receiver) + L"\\" + found.cFileName;
+        for (const std::wstring& file : ListFiles(source + receiver)) {
+            const std::wstring name = std::wstring(receiver) + L"\\" + file;
             EXPECT_EQ(ReadFileBytes(source + name), ReadFileBytes(target + name)) << Narrow(name);
             ++compared;
         }
-        if (files != INVALID_HANDLE_VALUE) FindClose(files);
     }
     EXPECT_EQ(12, compared) << "files in the three sample receivers";
 }

@@ -117,5 +117,4 @@ TEST_F(ReceiverLoadTest, TwoThousandFilesListAndSort) {
         for (size_t i = 1; i < order.size(); ++i) wrong += c.key(indexOf(order[i - 1])) > c.key(indexOf(order[i]));
         EXPECT_EQ(0, wrong);
     }
-
 }

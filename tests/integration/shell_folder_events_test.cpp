@@ -29,7 +29,6 @@ HWND AddViewWindow(IShellFolder* folder) {
     return view;
 }
 
-// Waits for a line written after the trace had `from` bytes.
 bool WaitForTrace(const std::string& line, size_t from) {
     return PumpUntil([&] { return ReadTraceLog().find(line, from) != std::string::npos; }, 15000);
 }

@@ -1,9 +1,6 @@
 // Guards the folder's view hosted in a browser of our own against the simulator: wrong status texts, menus and their states, command HRESULTs, view-state bytes, sort state, delete and properties, refresh paths, device manager faults and leaks.
 #include <gtest/gtest.h>
 
-#include <atomic>
-#include <thread>
-
 #include "com/ModuleLock.h"
 #include "module/ModuleApp.h"
 #include "module/ModuleState.h"
@@ -24,34 +21,6 @@ MenuRows MenuItems(HMENU menu) {
         items.emplace_back((item.fType & MFT_SEPARATOR) ? 0u : item.wID, item.fState & (MFS_GRAYED | MFS_DEFAULT | MFS_CHECKED));
     }
     return items;
-}
-
-std::wstring ChildText(HWND parent, int id) {
-    wchar_t text[260] = L"";
-    GetWindowTextW(GetDlgItem(parent, id), text, 260);
-    return text;
-}
-
-// Runs action on this thread while another thread reads and closes every dialog titled
-// title that it opens (a message box or the properties sheet); returns what was read.
-std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
-                                            const std::function<std::wstring(HWND)>& read) {
-    std::vector<std::wstring> seen;
-    std::atomic<bool> done(false);
-    std::thread closer([&] {
-        for (HWND last = nullptr; !done; Sleep(50)) {
-            HWND dialog = FindWindowW(L"#32770", title);
-            if (!dialog || dialog == last || !IsWindowVisible(dialog)) continue;
-            Sleep(200);  // let it finish initialising
-            seen.push_back(read(last = dialog));
-            PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
-            PostMessageW(dialog, WM_COMMAND, IDOK, 0);
-        }
-    });
-    action();
-    done = true;
-    closer.join();
-    return seen;
 }
 
 class ShellViewTest : public testing::Test {

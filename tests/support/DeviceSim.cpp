@@ -9,7 +9,6 @@ namespace {
 
 const wchar_t kSimKey[] = L"Software\\Calvex\\DeviceSim";
 
-// Runs a call that hands out an object and queries it for T.
 template <class T, class Call>
 ComPtr<T> Fetch(Call call, REFIID iid, HRESULT* result = nullptr) {
     ComPtr<IDispatch> object;

@@ -92,7 +92,6 @@ public:
 
     size_t Count(DISPID id) const { return Values(id).size(); }
     std::vector<LONG> Values(DISPID id) const;  // of every event of this id, in order
-    // Pumps messages until an event of this id has arrived; false after the timeout.
     bool WaitFor(DISPID id, DWORD timeout) const { return PumpUntil([&] { return Count(id) > 0; }, timeout); }
 
     std::vector<Event> events;

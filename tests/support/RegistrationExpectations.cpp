@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <cstring>
+#include <cwchar>
+
 #include "com/Handles.h"
 #include "support/TestSupport.h"
 
@@ -20,9 +23,11 @@ bool RegistryKeyExists(HKEY root, const std::wstring& path) {
 
 std::wstring RegistryText(HKEY root, const std::wstring& path, const wchar_t* name) {
     wchar_t text[512] = L"";
-    DWORD size = sizeof text;
-    return RegGetValueW(root, path.c_str(), name, RRF_RT_REG_SZ, nullptr, text, &size) == ERROR_SUCCESS
-               ? std::wstring(text) : L"<none>";
+    DWORD size = sizeof text, type = 0, value = 0;
+    if (RegGetValueW(root, path.c_str(), name, RRF_RT_REG_SZ | RRF_RT_REG_DWORD, &type, text, &size)) return L"<none>";
+    memcpy(&value, text, sizeof value);  // the buffer holds the DWORD's bytes: no aliasing cast
+    if (type == REG_DWORD) swprintf(text, 512, L"0x%08X", value);
+    return text;
 }
 
 void ExpectModuleRegistered(const std::wstring& dll) {
@@ -39,10 +44,7 @@ void ExpectModuleRegistered(const std::wstring& dll) {
         EXPECT_EQ(L"Apartment", RegistryText(HKEY_CLASSES_ROOT, key + L"\\InprocServer32", L"ThreadingModel"));
         EXPECT_EQ(L"{274B0214-A88B-43fd-AE0A-CD342C4C748F}", RegistryText(HKEY_CLASSES_ROOT, key + L"\\TypeLib"));
         EXPECT_EQ(f.tip, RegistryText(HKEY_CLASSES_ROOT, key, L"InfoTip"));
-        DWORD attributes = 0, size = sizeof attributes;
-        RegGetValueW(HKEY_CLASSES_ROOT, (key + L"\\ShellFolder").c_str(), L"Attributes", RRF_RT_REG_DWORD, nullptr,
-                     &attributes, &size);
-        EXPECT_EQ(0xA0000000u, attributes);
+        EXPECT_EQ(L"0xA0000000", RegistryText(HKEY_CLASSES_ROOT, key + L"\\ShellFolder", L"Attributes"));
         EXPECT_EQ(f.name, RegistryText(HKEY_LOCAL_MACHINE, kNameSpace + f.clsid));
         EXPECT_EQ(f.name, RegistryText(HKEY_LOCAL_MACHINE, kApproved, f.clsid.c_str()));
     }

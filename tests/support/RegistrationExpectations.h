@@ -8,7 +8,7 @@
 namespace testsupport {
 
 bool RegistryKeyExists(HKEY root, const std::wstring& path);
-// A REG_SZ value's text, or "<none>".
+// A REG_SZ value's text, a DWORD in hexadecimal ("0x0000002A"), or "<none>".
 std::wstring RegistryText(HKEY root, const std::wstring& path, const wchar_t* name = nullptr);
 
 // Checks with gtest's EXPECT that every key Explorer needs names the module at dllPath.

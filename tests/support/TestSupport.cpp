@@ -5,7 +5,9 @@
 #include "com/Handles.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cstdlib>
+#include <thread>
 
 namespace testsupport {
 
@@ -73,6 +75,32 @@ DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds, std::strin
     else
         TerminateProcess(process.hProcess, WAIT_TIMEOUT);
     return exitCode;
+}
+
+std::wstring ChildText(HWND parent, int id) {
+    wchar_t text[260] = L"";
+    GetWindowTextW(GetDlgItem(parent, id), text, 260);
+    return text;
+}
+
+std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
+                                            const std::function<std::wstring(HWND)>& read) {
+    std::vector<std::wstring> seen;
+    std::atomic<bool> done(false);
+    std::thread closer([&] {
+        for (HWND last = nullptr; !done; Sleep(50)) {
+            HWND dialog = FindWindowW(L"#32770", title);
+            if (!dialog || dialog == last || !IsWindowVisible(dialog)) continue;
+            Sleep(200);  // let it finish initialising
+            seen.push_back(read(last = dialog));
+            PostMessageW(dialog, WM_COMMAND, IDCANCEL, 0);
+            PostMessageW(dialog, WM_COMMAND, IDOK, 0);
+        }
+    });
+    action();
+    done = true;
+    closer.join();
+    return seen;
 }
 
 static std::wstring TempPath() {

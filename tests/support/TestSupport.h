@@ -15,7 +15,6 @@ std::wstring BuildDir();
 std::wstring SourceDir();
 std::wstring ModuleDllPath();  // the built CalvexReceiversShellExt.dll
 
-// Dispatches this thread's messages for the given time.
 void PumpMessagesFor(DWORD milliseconds);
 // Dispatches messages until done() or the timeout; returns done()'s last answer.
 bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
@@ -25,6 +24,13 @@ bool PumpUntil(const std::function<bool()>& done, DWORD timeoutMilliseconds);
 // it wrote to its standard output and error when out and err are given.
 DWORD RunProcess(std::wstring commandLine, DWORD timeoutMilliseconds = 60000, std::string* out = nullptr,
                  std::string* err = nullptr);
+
+// A dialog control's text.
+std::wstring ChildText(HWND parent, int id);
+// Runs action on this thread while another thread reads and closes every dialog titled
+// title that it opens (a message box or the properties sheet); returns what was read.
+std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::function<void()>& action,
+                                            const std::function<std::wstring(HWND)>& read);
 
 // A file's bytes, also while another holds it open for writing; empty when it cannot be read.
 std::string ReadFileBytes(const std::wstring& path);

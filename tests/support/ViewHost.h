@@ -5,7 +5,6 @@
 #include <shlobj.h>
 
 #include <algorithm>
-#include <algorithm>
 #include <map>
 #include <string>
 #include <vector>
@@ -121,7 +120,6 @@ inline HWND CountingViewWindow() {
     return CreateWindowExW(0, MAKEINTATOM(atom), L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, nullptr, nullptr);
 }
 
-// How often the module has traced this exact line so far.
 inline size_t CountTrace(const std::string& line) {
     const std::vector<std::string> messages = TraceMessages();
     return std::count(messages.begin(), messages.end(), line);

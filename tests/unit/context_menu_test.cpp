@@ -4,12 +4,12 @@
 
 #include <gtest/gtest.h>
 
-#include <functional>
 #include <string>
-#include <thread>
+#include <vector>
 
 #include "com/ComPtr.h"
 #include "module/ClassCreators.h"
+#include "support/TestSupport.h"
 
 namespace {
 class ContextMenuTest : public testing::Test {
@@ -17,20 +17,6 @@ protected:
     void SetUp() override { ASSERT_EQ(S_OK, CreateCalvexReceiversContextMenu(nullptr, IID_IContextMenu, menu.PutVoid())); }
     ComPtr<IContextMenu> menu;
 };
-
-// Waits for the information box, reads its text and whether it has an owner, and presses OK.
-void CloseBox(std::wstring& text, bool& owned) {
-    for (int i = 0; i < 500; ++i, Sleep(20)) {
-        HWND dialog = FindWindowW(L"#32770", L"Sample Explorer Bar");
-        if (!dialog) continue;
-        wchar_t buffer[256] = L"";
-        GetDlgItemTextW(dialog, 0xFFFF, buffer, 256);  // the message box's static text
-        text = buffer;
-        owned = GetWindow(dialog, GW_OWNER) != nullptr;
-        PostMessageW(dialog, WM_COMMAND, IDOK, 0);
-        return;
-    }
-}
 }  // namespace
 
 TEST_F(ContextMenuTest, QueryContextMenuAddsOneItemUnlessDefaultOnly) {
@@ -78,13 +64,10 @@ TEST_F(ContextMenuTest, InvokeCommandRefusesVerbsAndShowsTheBoxForOffsetZero) {
     }
     EXPECT_EQ(nullptr, FindWindowW(L"#32770", L"Sample Explorer Bar"));
 
-    std::wstring text;
-    bool owned = false;
-    std::thread closer(CloseBox, std::ref(text), std::ref(owned));
     CMINVOKECOMMANDINFO info = {sizeof info, 0, owner, MAKEINTRESOURCEA(0)};
-    EXPECT_EQ(S_OK, menu->InvokeCommand(&info));
-    closer.join();
-    EXPECT_EQ(L"Explorer Bar Command selected.", text) << "a box titled \"Sample Explorer Bar\"";
-    EXPECT_TRUE(owned);
+    const std::vector<std::wstring> boxes = testsupport::WithDialogsClosed(
+        L"Sample Explorer Bar", [&] { EXPECT_EQ(S_OK, menu->InvokeCommand(&info)); },
+        [](HWND box) { return testsupport::ChildText(box, 0xFFFF) + (GetWindow(box, GW_OWNER) ? L"|owned" : L"|no owner"); });
+    EXPECT_EQ(std::vector<std::wstring>{L"Explorer Bar Command selected.|owned"}, boxes);
     DestroyWindow(owner);
 }

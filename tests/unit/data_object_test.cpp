@@ -32,7 +32,6 @@ protected:
         memcpy(&data->time, &time, sizeof(time));
         return list;
     }
-    // The block handed out for an HGLOBAL format, copied out and released.
     std::string Block(const wchar_t* format) {
         FORMATETC etc = Etc(format, TYMED_HGLOBAL);
         STGMEDIUM medium = {};

@@ -14,6 +14,8 @@
 namespace {
 const wchar_t kRoot[] = L"Calvex Receivers";
 const wchar_t kKey[] = L"123!Z#5!COM3";
+const BYTE kEmptyBytes[2] = {0, 0};
+const LPCITEMIDLIST kEmpty = reinterpret_cast<LPCITEMIDLIST>(kEmptyBytes);
 
 class PidlManagerTest : public ::testing::Test {
 protected:
@@ -82,15 +84,13 @@ TEST_F(PidlManagerTest, PathsGiveRootReceiverAndFile) {
 }
 
 TEST_F(PidlManagerTest, ListOperationsOnEmptyNullAndShortLists) {
-    const BYTE emptyBytes[2] = {0, 0};
-    auto empty = reinterpret_cast<LPCITEMIDLIST>(emptyBytes);
     UniquePidl one = Make({{1, kRoot}}), three = Make({{1, kRoot}, {3, kKey}, {6, L"FILE.qpr"}});
-    EXPECT_EQ(std::make_tuple(mgr.GetSize(nullptr), mgr.GetSize(empty), mgr.GetSize(three.Get())),
+    EXPECT_EQ(std::make_tuple(mgr.GetSize(nullptr), mgr.GetSize(kEmpty), mgr.GetSize(three.Get())),
               std::make_tuple(0u, 2u, 2u + 61 + 53 + 45));
-    EXPECT_EQ(std::make_tuple(mgr.GetItemCount(nullptr), mgr.GetItemCount(empty), mgr.GetItemCount(three.Get())),
+    EXPECT_EQ(std::make_tuple(mgr.GetItemCount(nullptr), mgr.GetItemCount(kEmpty), mgr.GetItemCount(three.Get())),
               std::make_tuple(0u, 0u, 3u));
     EXPECT_EQ(mgr.GetLastItemType(three.Get()), 6u);
-    const void* nulls[] = {mgr.GetLastItem(nullptr), mgr.GetLastItem(empty), mgr.CopyFrom(nullptr, 0), mgr.CopyFrom(empty, 0),
+    const void* nulls[] = {mgr.GetLastItem(nullptr), mgr.GetLastItem(kEmpty), mgr.CopyFrom(nullptr, 0), mgr.CopyFrom(kEmpty, 0),
                            mgr.GetNextItem(nullptr), mgr.GetData(nullptr), mgr.CopyParent(one.Get()), mgr.CopyParent(nullptr),
                            mgr.CopyFrom(three.Get(), 3), mgr.Concatenate(nullptr, nullptr)};
     for (size_t i = 0; i < sizeof nulls / sizeof nulls[0]; ++i) { EXPECT_EQ(nulls[i], nullptr) << i; }
@@ -124,8 +124,7 @@ TEST_F(PidlManagerTest, PathTexts) {
     };
     for (const auto& c : cases) {
         UniquePidl list = Make(c.items);
-        const BYTE emptyBytes[2] = {0, 0};
-        LPCITEMIDLIST item = list ? list.Get() : reinterpret_cast<LPCITEMIDLIST>(emptyBytes);
+        LPCITEMIDLIST item = list ? list.Get() : kEmpty;
         wchar_t buffer[MAX_PATH] = L"junk";
         EXPECT_EQ(mgr.GetPath(item, buffer, MAX_PATH, c.keepKeys), c.result);
         if (c.text) { EXPECT_STREQ(buffer, c.text); }

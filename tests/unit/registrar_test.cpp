@@ -1,14 +1,13 @@
 // Guards the registrar: keywords, values, quoting or substitution misread, keys removed that are not ours, malformed scripts that write.
 #include <windows.h>
 
-#include <cwchar>
-#include <cstring>
 #include <string>
 
 #include <gtest/gtest.h>
 
 #include "com/Handles.h"
 #include "module/Registrar.h"
+#include "support/RegistrationExpectations.h"
 
 namespace {
 const wchar_t kRoot[] = L"Software\\CalvexTests\\Registrar";
@@ -19,21 +18,10 @@ std::wstring Script(const std::wstring& body) {
 }
 
 bool KeyExists(const std::wstring& sub, const wchar_t* root = kRoot) {
-    UniqueRegKey key;
-    return !RegOpenKeyExW(HKEY_CURRENT_USER, (std::wstring(root) + L"\\" + sub).c_str(), 0, KEY_READ, key.Put());
+    return testsupport::RegistryKeyExists(HKEY_CURRENT_USER, std::wstring(root) + L"\\" + sub);
 }
-
-// The value as text ("<none>" when missing); a DWORD in hexadecimal.
 std::wstring Value(const std::wstring& sub, const wchar_t* name) {
-    wchar_t text[512] = L"";
-    DWORD size = sizeof text, type = 0;
-    if (RegGetValueW(HKEY_CURRENT_USER, (std::wstring(kRoot) + L"\\" + sub).c_str(), name,
-                     RRF_RT_REG_SZ | RRF_RT_REG_DWORD, &type, text, &size))
-        return L"<none>";
-    DWORD value = 0;
-    memcpy(&value, text, sizeof value);  // the buffer holds the DWORD's bytes: no aliasing cast
-    if (type == REG_DWORD) swprintf(text, 512, L"0x%08X", value);
-    return text;
+    return testsupport::RegistryText(HKEY_CURRENT_USER, std::wstring(kRoot) + L"\\" + sub, name);
 }
 
 class RegistrarTest : public testing::Test {
