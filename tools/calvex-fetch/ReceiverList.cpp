@@ -63,3 +63,7 @@ std::wstring HexText(HRESULT hr) {
     swprintf(text, 16, L"0x%08X", static_cast<unsigned>(hr));
     return text;
 }
+
+std::wstring NoDeviceManagerText(HRESULT hr) {
+    return L"no device manager: it cannot be started (" + HexText(hr) + L")";
+}

@@ -39,3 +39,5 @@ HRESULT ConnectDeviceManager(ComPtr<IDispatch>& manager);
 HRESULT AskDeviceManager(IDispatch* manager);
 // "0x8007001F"
 std::wstring HexText(HRESULT hr);
+// Why nothing can be done without a device manager: what the batch and the watch both say.
+std::wstring NoDeviceManagerText(HRESULT hr);

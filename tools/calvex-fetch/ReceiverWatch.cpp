@@ -68,7 +68,7 @@ int ReceiverWatch::Run() {
 bool ReceiverWatch::Start() {
     HRESULT hr = ConnectDeviceManager(m_manager);
     if (FAILED(hr)) {
-        m_console.Error(L"no device manager: it cannot be started (" + HexText(hr) + L")");
+        m_console.Error(NoDeviceManagerText(hr));
         return false;
     }
     std::vector<PCIDLIST_ABSOLUTE> folders;

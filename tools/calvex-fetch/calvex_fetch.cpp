@@ -89,7 +89,7 @@ bool Select(const FetchOptions& options, std::vector<Receiver>& receivers, std::
 std::wstring WhyNoReceivers() {
     ComPtr<IDispatch> manager;
     const HRESULT hr = ConnectDeviceManager(manager);
-    return FAILED(hr) ? L"no device manager: it cannot be started (" + HexText(hr) + L")" : kNoReceiver;
+    return FAILED(hr) ? NoDeviceManagerText(hr) : std::wstring(kNoReceiver);
 }
 
 void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options, FetchConsole& console,
