@@ -1,9 +1,10 @@
 #!/usr/bin/env bash
 # fetch_watch_restart_check.sh BUILD_DIR: the windowless calvex-fetchw --watch, as started at
-# logon, through a restart of the device manager. Files logged while it is away come once it
-# is back; a second watch and a batch run into the same folder are refused while the first
-# runs on; the end of the session stops it during a download without leaving a partial file.
-# Guards against a watch that ends for good with the device manager, files fetched twice by
+# logon, started before the device manager is installed and through a restart of it. Files
+# logged while it is away come once it is back; a second watch and a batch run into the same
+# folder are refused while the first runs on; the end of the session stops it during a
+# download without leaving a partial file.
+# Guards against a watch that ends for good without the device manager, files fetched twice by
 # racing tools, a log without its lines, and a logoff that leaves half a file.
 set -u
 build=$1
@@ -23,8 +24,14 @@ receiver "$root/Brennor C" 2 2000-0003 C
 log "$root/Brennor C" LOG0001 4000
 "$run" "$build/CalvexDeviceSim.exe" /Quit
 "$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$root")" /f >/dev/null 2>&1
+# Started at logon before the device manager is installed: it waits, and fetches once it is.
+"$run" "$build/CalvexDeviceSim.exe" /UnregServer
 "$run" "$build/calvex-fetchw.exe" --watch --log "$(win "$wlog")" "$(win "$target")" >"$work/out.txt" 2>&1 &
 tool=$!
+waitfor "$wlog" "no device manager: it cannot be started (0x80040154): waiting for it" 30
+waitfor "$wlog" "no device manager yet (0x80040154)" 15
+"$run" "$build/CalvexDeviceSim.exe" /RegServer
+waitfor "$wlog" "the device manager is back: every receiver is compared in full" 30
 waitfor "$wlog" "fetched     A@USB\\LOG0001" 60
 waitfor "$wlog" "fetched     C@USB\\LOG0001" 30
 
@@ -40,6 +47,12 @@ grep -qE "^[0-9:]{8} $(printf '%s' "$refusal" | sed 's/[\\.]/\\&/g')" "$target/c
 [ $status -eq 2 ] || bad "a batch run into the watched folder ended with $status"
 grep -qF "$refusal" "$work/batch.err" || bad "the batch run's stderr: $(cat "$work/batch.err")"
 kill -0 $tool 2>/dev/null || bad "the first watch did not run on"
+# Without a console, what stops it before the target's log is open is said where the user looks.
+fallback=$(echo "$prefix"/drive_c/users/*/AppData/Local)/calvex-fetch.log
+rm -f "$fallback"
+"$run" "$build/calvex-fetchw.exe" --watch --bogus "$(win "$target")" >/dev/null 2>&1; status=$?
+[ $status -eq 2 ] || bad "a mistyped option ended with $status"
+grep -q "^[0-9:]\{8\} calvex-fetch: unknown option --bogus" "$fallback" || bad "the fallback log: $(cat "$fallback")"
 rm -f "$target/calvex-fetch.log"
 
 # The device manager quits (a service restart); files logged meanwhile come once it is back.
@@ -47,7 +60,7 @@ rm -f "$target/calvex-fetch.log"
 waitfor "$wlog" "the device manager is gone (0x" 15
 log "$root/Calvex A" LOG0002 5000
 log "$root/Brennor C" LOG0002 6000
-waitfor "$wlog" "the device manager is back: every receiver is compared in full" 40
+waitfor "$wlog" "the device manager is back: every receiver is compared in full" 40 2
 waitfor "$wlog" "fetched     A@USB\\LOG0002" 30
 waitfor "$wlog" "fetched     C@USB\\LOG0002" 30
 

@@ -6,9 +6,11 @@ win() { echo "Z:$1" | sed 's|/|\\|g'; }
 
 bad() { fail=1; echo "FAIL: $*"; }
 
-waitfor() {  # waitfor FILE TEXT SECONDS: until FILE holds TEXT; a failure when it does not in time
-  for _ in $(seq 1 $(($3 * 10))); do grep -qF -- "$2" "$1" 2>/dev/null && return 0; sleep 0.1; done
-  bad "no \"$2\" in $(basename "$1") within $3 s"; return 1
+waitfor() {  # waitfor FILE TEXT SECONDS [TIMES]: until FILE holds TEXT (TIMES times); a failure when it does not in time
+  for _ in $(seq 1 $(($3 * 10))); do
+    [ "$(grep -cF -- "$2" "$1" 2>/dev/null)" -ge "${4:-1}" ] && return 0; sleep 0.1
+  done
+  bad "no \"$2\" ${4:+($4 times) }in $(basename "$1") within $3 s"; return 1
 }
 
 # The watch tests' receivers: they use $prefix (the Wine prefix), $root (the simulator's tree),

@@ -145,7 +145,6 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
         {L"--watch --all " + Quoted(target.Path()), "calvex-fetch: --watch and --all exclude each other\r\n"},
         {L"--dry-run --watch " + Quoted(target.Path()), "calvex-fetch: --watch and --dry-run exclude each other\r\n"},
         {Quoted(target.Path()), "calvex-fetch: no device manager: it cannot be started (0x", true},
-        {L"--watch " + Quoted(target.Path()), "calvex-fetch: no device manager: it cannot be started (0x", true},
     };
     for (const Refusal& refusal : refusals) {
         SCOPED_TRACE(Narrow(refusal.arguments));

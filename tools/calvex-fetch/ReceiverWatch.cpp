@@ -66,10 +66,12 @@ int ReceiverWatch::Run() {
 }
 
 bool ReceiverWatch::Start() {
+    // Started at logon, the watch may come before the device manager's service (or before it
+    // is installed): it waits for it, as for one that goes away later.
     HRESULT hr = ConnectDeviceManager(m_manager);
     if (FAILED(hr)) {
-        m_console.Error(NoDeviceManagerText(hr));
-        return false;
+        m_console.Line(NoDeviceManagerText(hr) + L": waiting for it");
+        m_gone = true;
     }
     std::vector<PCIDLIST_ABSOLUTE> folders;
     std::wstring names;

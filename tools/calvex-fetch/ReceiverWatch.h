@@ -25,7 +25,7 @@ public:
                   const std::atomic<bool>& interrupted, HANDLE stop);
 
     // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start
-    // (the reason on stderr). A device manager that goes away is waited for.
+    // (the reason on stderr). A device manager that is not there yet, or goes away, is waited for.
     int Run();
 
 private:

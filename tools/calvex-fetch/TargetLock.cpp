@@ -14,11 +14,13 @@ std::wstring TargetLockName(const std::wstring& target) {
         hash = (hash ^ static_cast<unsigned>(c)) * 1099511628211ull;
     }
     wchar_t name[48];
-    swprintf(name, 48, L"Local\\calvex-fetch-%016llX", hash);
+    swprintf(name, 48, L"Global\\calvex-fetch-%016llX", hash);
     return name;
 }
 
 bool TargetLock::Acquire(const std::wstring& target) {
+    // Another user's watch on a shared folder holds a mutex this user may not open: that
+    // fails with access denied, and refuses just the same.
     m_mutex.Reset(CreateMutexW(nullptr, TRUE, TargetLockName(target).c_str()));
     if (m_mutex && GetLastError() != ERROR_ALREADY_EXISTS) return true;
     m_mutex.Reset();

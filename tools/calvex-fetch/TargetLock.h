@@ -1,8 +1,8 @@
 #pragma once
-// One calvex-fetch at a time per target folder: two of them would race for the same files. A
-// named mutex per target, held for the tool's whole run and let go by Windows when the process
-// ends, however it ends. Two spellings of one folder (case, a short 8.3 name, a trailing "\")
-// are one target.
+// One calvex-fetch at a time per target folder, across the users logged on: two of them would
+// race for the same files. A named mutex per target, held for the tool's whole run and let go
+// by Windows when the process ends, however it ends. Two spellings of one folder (case, a
+// short 8.3 name, a trailing "\") are one target.
 #include <windows.h>
 
 #include <string>
@@ -18,6 +18,6 @@ private:
     UniqueHandle m_mutex;
 };
 
-// "Local\calvex-fetch-" and a hash of the target's normalized path (a mutex name cannot hold
+// "Global\calvex-fetch-" and a hash of the target's normalized path (a mutex name cannot hold
 // a "\" and is short).
 std::wstring TargetLockName(const std::wstring& target);

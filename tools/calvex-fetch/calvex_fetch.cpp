@@ -7,7 +7,8 @@
 // the device manager: 0 or 1 as above.
 //
 // Built twice: calvex-fetch.exe for a console, calvex-fetchw.exe (CALVEX_WINDOWLESS) without
-// one, to be started at logon; that one logs to TARGET\calvex-fetch.log unless told otherwise.
+// one, to be started at logon; that one logs to TARGET\calvex-fetch.log unless told otherwise
+// (to %LOCALAPPDATA%\calvex-fetch.log when it cannot get that far).
 #include <windows.h>
 #include <ole2.h>
 
@@ -85,6 +86,18 @@ bool Select(const FetchOptions& options, std::vector<Receiver>& receivers, std::
     return true;
 }
 
+#ifdef CALVEX_WINDOWLESS
+// Without a console, what cannot go to the target's log (bad arguments, a target that cannot
+// be written) goes to one place of the user's own: %LOCALAPPDATA%\calvex-fetch.log.
+void LogWhereTheUserLooks(FetchConsole& console) {
+    wchar_t folder[MAX_PATH];
+    const DWORD length = GetEnvironmentVariableW(L"LOCALAPPDATA", folder, MAX_PATH);
+    if (length && length < MAX_PATH) console.SetLog(std::wstring(folder) + L"\\calvex-fetch.log");
+}
+#else
+void LogWhereTheUserLooks(FetchConsole&) {}
+#endif
+
 // Why nothing was listed: the device manager cannot be reached, or no receiver is connected.
 std::wstring WhyNoReceivers() {
     ComPtr<IDispatch> manager;
@@ -127,6 +140,7 @@ int Fetch(const FetchOptions& options, FetchConsole& console) {
     if (!options.log.empty()) console.SetLog(FullPath(options.log));
 #endif
     if (!options.dryRun && !IsWritableFolder(target)) {
+        if (options.log.empty()) LogWhereTheUserLooks(console);
         console.Error(L"target not writable: " + target);
         return 2;
     }
@@ -176,6 +190,7 @@ int wmain(int argc, wchar_t** argv) {
     FetchOptions options;
     std::wstring error;
     if (!ParseFetchOptions(std::vector<std::wstring>(argv + 1, argv + argc), options, error)) {
+        LogWhereTheUserLooks(console);
         console.Error(error);
         console.Line(kFetchUsage);
         return 2;
