@@ -134,6 +134,11 @@ TEST(DeviceSimContractTest, TreeChangesArriveAsEventsAndRefreshFiresBeforeItRetu
     EXPECT_TRUE(ReceiverByKey(receivers.Get(), L"Unknown-300-3"));
     PumpMessagesFor(1000);  // the watcher's own rescan has nothing more to report
     EXPECT_EQ(2u, receiverEvents->Count(1));
+    tree.AddFile(L"base", L"LOG0002", 75);  // rewritten in place, its receiver plugged in throughout
+    ASSERT_EQ(S_OK, manager->Refresh());
+    long size = 0;
+    EXPECT_EQ(S_OK, FileByName(files.Get(), L"LOG0002")->get_Size(&size));
+    EXPECT_EQ(75, size) << "a download of the old size would be refused as garbled";
     fileEvents->Unadvise(files.Get());
     receiverEvents->Unadvise(receivers.Get());
 }
