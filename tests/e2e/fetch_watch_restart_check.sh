@@ -2,8 +2,8 @@
 # fetch_watch_restart_check.sh BUILD_DIR: the windowless calvex-fetchw --watch, as started at
 # logon, started before the device manager is installed and through a restart of it. Files
 # logged while it is away come once it is back; a second watch and a batch run into the same
-# folder are refused while the first runs on; the end of the session stops it during a
-# download without leaving a partial file.
+# folder are refused while the first runs on; no download dialog comes on the screen; the end
+# of the session stops it during a download without leaving a partial file.
 # Guards against a watch that ends for good without the device manager, files fetched twice by
 # racing tools, a log without its lines, and a logoff that leaves half a file.
 set -u
@@ -67,6 +67,12 @@ waitfor "$wlog" "fetched     C@USB\\LOG0002" 30
 # The session ends while a file downloads: discarded, a summary, the process gone.
 log "$root/Calvex A" BIG0001 200000
 downloading "Calvex A" BIG0001 && sleep 1
+# Nothing in the user's way: the product's download dialog runs, but off the screen.
+dialogs=$(xdotool search --name "^File Download$" 2>/dev/null)
+[ -n "$dialogs" ] || bad "no download dialog while BIG0001 downloads"
+for w in $dialogs; do
+  xdotool getwindowgeometry "$w" | grep -q "Position: -32000,-32000" || bad "on the screen: $(xdotool getwindowgeometry "$w")"
+done
 "$run" wineboot --end-session
 ends $tool 20; status=$?
 [ $status -eq 0 ] || bad "exit code $status at the end of the session"

@@ -21,6 +21,7 @@
 #include "FetchConsole.h"
 #include "FetchOptions.h"
 #include "MessageBoxAnswerer.h"
+#include "OffScreenDialogs.h"
 #include "ReceiverFetcher.h"
 #include "ReceiverList.h"
 #include "ReceiverWatch.h"
@@ -203,6 +204,7 @@ int wmain(int argc, wchar_t** argv) {
     {
 #ifdef CALVEX_WINDOWLESS
         SessionEndWindow sessionEnd([] { Stop(true); });
+        OffScreenDialogs offScreen;
 #endif
         MessageBoxAnswerer answerer([&](const std::wstring& title, const std::wstring& text) {
             std::wstring flat = text;
