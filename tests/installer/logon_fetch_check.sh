@@ -1,0 +1,60 @@
+#!/usr/bin/env bash
+# logon_fetch_check.sh BUILD_DIR: the automatic download as a surveyor meets it. The MSI with
+# AutoFetch (and the simulated device manager's sample receivers) into a prefix made afresh;
+# then a logon (Wine runs the Run values when wineboot starts a session): every sample file
+# lands in FETCHDIR once with nothing partial, a log says what happened, a file logged while
+# the device manager restarts comes too; after /x a logon starts no watch.
+# Guards against a logon value that does not start, quotes or points wrongly, a watch that
+# needs a console, and a removal that leaves the watch starting at each logon.
+set -u
+build=$1
+export CALVEX_WINEPREFIX="$build/logon-test-prefix" WINEPREFIX="$build/logon-test-prefix"
+run="$build/wine-run"
+source "$(dirname "$0")/../e2e/lib.sh"
+fail=0
+"$(dirname "$0")/../wine/prepare-prefix.sh" --fresh "$build" >/dev/null
+msi=$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null)
+survey="$WINEPREFIX/drive_c/Survey" wlog="$WINEPREFIX/drive_c/Survey/calvex-fetch.log"
+installed="$WINEPREFIX/drive_c/Program Files/Calvex/Receivers Shell Extension"
+logon() { wineserver -k; wineserver -w; "$run" wineboot; }  # a new session, as at logon
+watching() {  # a calvex-fetchw of this prefix runs
+  local pid
+  for pid in $(pgrep -f 'calvex-fetchw\.exe'); do
+    tr '\0' '\n' <"/proc/$pid/environ" 2>/dev/null | grep -qxF "WINEPREFIX=$WINEPREFIX" && return 0
+  done
+  return 1
+}
+
+"$run" msiexec /i "$msi" /qn ADDLOCAL=ALL 'FETCHDIR=C:\Survey' || bad "msiexec /i ended with $?"
+expected=$("$run" "$installed/calvex-fetch.exe" --dry-run 'C:\Survey' | tr -d '\r' | sed -n 's/^dry run: \([0-9]*\) to fetch.*/\1/p')
+[ "${expected:-0}" -ge 15 ] || bad "the sample receivers offer ${expected:-no} files"
+logon
+waitfor "$wlog" 'watching the Calvex and Brennor receivers, new files into C:\Survey (Ctrl+C stops)' 60
+for _ in $(seq 1 900); do
+  [ "$(grep -c '  fetched     ' "$wlog" 2>/dev/null)" -ge "${expected:-1}" ] && break; sleep 0.1
+done
+fetched=$(find "$survey" -mindepth 2 -type f ! -name '*.calvex-partial' | wc -l)
+[ "$fetched" = "$expected" ] || bad "$fetched of $expected sample files in C:\\Survey"
+[ "$(grep -c '  fetched     ' "$wlog")" = "$expected" ] || bad "fetched lines: $(grep -c '  fetched     ' "$wlog")"
+watching || bad "no watch runs after the logon"
+
+# The device manager's service restarts; a file logged meanwhile comes once it is back.
+"$run" "$installed/CalvexDeviceSim.exe" /Quit
+waitfor "$wlog" "the device manager is gone (0x" 15
+printf 'logged during the restart' >"$installed/sample-receivers/Calvex Q9 USB/LOG0099"
+waitfor "$wlog" "the device manager is back: every receiver is compared in full" 40
+waitfor "$wlog" 'fetched     Q9 GNSS@USB\LOG0099.qpr' 30
+cmp -s "$installed/sample-receivers/Calvex Q9 USB/LOG0099" "$survey/Q9 GNSS@USB/LOG0099.qpr" || bad "LOG0099 differs"
+[ -z "$(find "$survey" -name '*.calvex-partial')" ] || bad "partial files: $(find "$survey" -name '*.calvex-partial')"
+tr -d '\r' <"$wlog"
+
+# Removed: the logon value goes, the fetched files and the log stay, a logon starts nothing.
+"$run" msiexec /x "$msi" /qn || bad "msiexec /x ended with $?"
+logon
+sleep 5
+watching && bad "a watch still starts at logon after the removal"
+[ -f "$wlog" ] && [ -f "$survey/Q9 GNSS@USB/LOG0099.qpr" ] || bad "the removal took the fetched files or the log"
+wineserver -k || true
+rm -rf "$WINEPREFIX"
+[ $fail -eq 0 ] && echo "PASS: installed, a logon fetched $expected files and one more through a restart; removed, nothing starts"
+exit $fail
