@@ -14,22 +14,10 @@
 #include <string>
 #include <vector>
 
+#include "HandleTable.h"
+
 namespace {
 const CLSID kDeviceManagerClass = {0x0FADF314, 0xB4FD, 0x413C, {0x9E, 0x26, 0x6B, 0xC4, 0x9B, 0x06, 0x60, 0x80}};
-
-// Wine answers GetProcessHandleCount with zero: the system's handle table tells.
-long OwnHandles() {
-    using Query = NTSTATUS(NTAPI*)(SYSTEM_INFORMATION_CLASS, PVOID, ULONG, PULONG);
-    static const auto query = reinterpret_cast<Query>(
-        reinterpret_cast<void*>(GetProcAddress(GetModuleHandleW(L"ntdll.dll"), "NtQuerySystemInformation")));
-    std::vector<BYTE> buffer(1 << 22);
-    ULONG needed = 0;
-    if (query(SystemHandleInformation, buffer.data(), static_cast<ULONG>(buffer.size()), &needed) < 0) return -1;
-    const auto* table = reinterpret_cast<const SYSTEM_HANDLE_INFORMATION*>(buffer.data());
-    long count = 0;
-    for (ULONG i = 0; i < table->Count; ++i) count += table->Handle[i].OwnerPid == GetCurrentProcessId();
-    return count;
-}
 
 HRESULT AskReceivers(IDispatch* manager) {
     DISPPARAMS none = {};
@@ -76,7 +64,7 @@ int wmain(int argc, wchar_t** argv) {
         HRESULT gone = S_OK;
         for (int call = 0; call < calls; ++call) gone = AskReceivers(manager);
         manager->Release();
-        last = OwnHandles();
+        last = HandleCount(GetCurrentProcessId());
         if (cycle == 0) first = last;  // the first cycle loads what every later one reuses
         std::printf("cycle %d: the call after the restart gave 0x%08lX; %ld handles\n", cycle,
                     static_cast<unsigned long>(gone), last);

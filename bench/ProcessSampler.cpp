@@ -4,8 +4,7 @@
 // names of its file and key handles), to tell what a growing count is made of. The soak (scripts/soak-watch.sh) judges from these, with the private
 // memory it reads on the Linux side, whether a long watch leaks.
 //
-// Handles are counted in the system's handle table: Wine 8 answers GetProcessHandleCount and
-// GetProcessMemoryInfo for another process with zeros, but fills SystemHandleInformation.
+// Handles are counted in the system's handle table (HandleTable.h).
 #include <windows.h>
 #include <winternl.h>
 #include <tlhelp32.h>
@@ -15,6 +14,8 @@
 #include <map>
 #include <string>
 #include <vector>
+
+#include "HandleTable.h"
 
 namespace {
 // The process id and thread count of the first process of that name, 0 when there is none.
@@ -32,32 +33,6 @@ DWORD FindProcess(const wchar_t* name, DWORD* threads) {
     return found;
 }
 
-using QuerySystem = NTSTATUS(NTAPI*)(SYSTEM_INFORMATION_CLASS, PVOID, ULONG, PULONG);
-
-std::vector<BYTE> HandleTable() {
-    static const auto query = reinterpret_cast<QuerySystem>(
-        reinterpret_cast<void*>(GetProcAddress(GetModuleHandleW(L"ntdll.dll"), "NtQuerySystemInformation")));
-    std::vector<BYTE> buffer(1 << 20);
-    for (;;) {
-        ULONG needed = 0;
-        const NTSTATUS status = query(SystemHandleInformation, buffer.data(), static_cast<ULONG>(buffer.size()), &needed);
-        if (status == static_cast<NTSTATUS>(0xC0000004L)) {  // STATUS_INFO_LENGTH_MISMATCH
-            buffer.resize(buffer.size() * 2);
-            continue;
-        }
-        if (status < 0) return {};
-        return buffer;
-    }
-}
-
-long HandleCount(DWORD process) {
-    const std::vector<BYTE> buffer = HandleTable();
-    if (buffer.empty()) return -1;
-    const auto* table = reinterpret_cast<const SYSTEM_HANDLE_INFORMATION*>(buffer.data());
-    long count = 0;
-    for (ULONG i = 0; i < table->Count; ++i) count += table->Handle[i].OwnerPid == process;
-    return count;
-}
 using QueryObject = NTSTATUS(NTAPI*)(HANDLE, OBJECT_INFORMATION_CLASS, PVOID, ULONG, PULONG);
 
 // What NtQueryObject says of a handle: its kind, or its name (ObjectNameInformation is 1).
