@@ -116,6 +116,8 @@ bool ReceiverDescription::ParseReport(const IniText::Section& section, std::wstr
             read = report.timeSet = stop != entry.value.c_str();
         } else if (SameTextNoCase(entry.key, L"Size")) {
             read = report.sizeSet = ParseInteger32(entry.value, &report.size);
+        } else if (SameTextNoCase(entry.key, L"Found")) {
+            read = report.foundAsNothing = SameTextNoCase(entry.value, L"nothing");
         } else if (SameTextNoCase(entry.key, L"NameLength")) {
             read = ParseInteger32(entry.value, &report.nameLength) && report.nameLength >= 0 &&
                    report.nameLength <= 4096;

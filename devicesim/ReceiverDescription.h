@@ -31,6 +31,7 @@ struct ReceiverDescription {
         bool timeSet = false;
         DATE time = 0;
         long nameLength = 0;  // names padded with "_" up to this length; 0: as they are
+        bool foundAsNothing = false;  // a lookup that finds it answers S_OK with no object
     } report;
 
     // False with a reason when a required key is missing or a value does not read.

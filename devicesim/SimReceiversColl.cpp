@@ -72,7 +72,7 @@ HRESULT SimReceiversColl::FindReceiver(const wchar_t* call, const Match& match, 
     for (const auto& record : m_model->Receivers()) {
         if (!match(*record)) continue;
         HRESULT hr = m_model->CallFault(call, record.get());
-        if (FAILED(hr)) return hr;
+        if (FAILED(hr) || record->description.report.foundAsNothing) return hr;
         HRESULT created = SimReceiver::Create(m_model, record, receiver);
         return FAILED(created) ? created : hr;
     }

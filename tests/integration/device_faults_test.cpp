@@ -103,6 +103,7 @@ TEST_F(DeviceFaultsTest, EveryFaultEndsInTimeWithTheRightOutcome) {
         {"unplugged while a file downloads", slow, Step::Download, S_OK, 4, 0, 1, 1, 20000, Unplug::WhileDownloading},
         {"negative size", {L"[Report]", L"Size=-5"}, Step::Download, S_OK, 4, 0, 1, 0, 20000},
         {"time that is no date", {L"[Report]", L"Time=nan"}, Step::Download, S_OK, 4, 1, 0, 0, 20000},
+        {"found, but S_OK with no object", {L"[Report]", L"Found=nothing"}, Step::Files, E_INVALIDARG, -1, 0, 0, 0, 10000},
         // Too long for any target: refused by the name rules before a download is asked for.
         {"300-character file names", {L"[Report]", L"NameLength=300"}, Step::Download, S_OK, 4, 0, 1, 0, 20000},
         {"300-character serial number", {}, Step::Files, E_INVALIDARG, -1, 0, 0, 0, 10000, Unplug::Never,

@@ -203,6 +203,11 @@ TEST(DeviceSimContractTest, ConfiguredFaultsAndDownloadsGiveTheirResults) {
     EXPECT_EQ(std::vector<LONG>{HRESULT_FROM_WIN32(ERROR_CANCELLED)}, slow.events->Values(3));
     EXPECT_LT(slow.events->Values(2).back(), 100);
     EXPECT_EQ(HRESULT_FROM_WIN32(ERROR_INVALID_STATE), slow.file->Cancel());
+    RecordedDownload unplugged(manager.Get(), L"COM5-700-2");  // and the receiver goes mid-way
+    ASSERT_TRUE(unplugged.events->WaitFor(2, kWait));
+    ASSERT_TRUE(tree.RemoveReceiver(L"slow"));
+    ASSERT_TRUE(unplugged.WaitForFinish());
+    EXPECT_EQ(std::vector<LONG>{HRESULT_FROM_WIN32(ERROR_DEVICE_NOT_CONNECTED)}, unplugged.events->Values(3));
 
     ASSERT_EQ(S_OK, fast.file->Delete());
     EXPECT_FALSE(FileExists(fastPath));
