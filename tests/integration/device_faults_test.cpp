@@ -10,6 +10,7 @@
 
 #include "MessageBoxAnswerer.h"
 #include "VirtualFiles.h"
+#include "com/ModuleLock.h"
 #include "module/ModuleApp.h"
 #include "support/DeviceSim.h"
 #include "support/ViewHost.h"
@@ -154,5 +155,6 @@ TEST_F(DeviceFaultsTest, EveryFaultEndsInTimeWithTheRightOutcome) {
         DeleteFileW((dir + L"\\LOG0001.qpr").c_str());
         EXPECT_TRUE(RemoveDirectoryW(dir.c_str())) << "something else was left";
         EXPECT_TRUE(row.step != Step::Delete || FileExists(tree.FolderPath(L"Calvex A") + L"\\LOG0001"));
+        EXPECT_EQ(0, ModuleLock::Count()) << "an object of the row is still held, so Explorer cannot unload us";
     }
 }
