@@ -2,8 +2,9 @@
 
 const wchar_t kFetchUsage[] =
     L"usage: calvex-fetch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--all | --new] "
-    L"[--dry-run] [--log FILE] TARGET\n"
-    L"       calvex-fetch --watch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--log FILE] TARGET\n";
+    L"[--move] [--layout PATTERN] [--dry-run] [--log FILE] TARGET\n"
+    L"       calvex-fetch --watch [--brand calvex|brennor|all] [--receiver KEY-or-display-name]... [--move] "
+    L"[--layout PATTERN] [--no-notify] [--log FILE] TARGET\n";
 
 namespace {
 bool Fail(std::wstring& error, const std::wstring& reason) {
@@ -25,11 +26,13 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::wstring& argument = arguments[i];
         const bool hasValue = i + 1 < arguments.size();
-        if (argument == L"--brand" || argument == L"--receiver" || argument == L"--log") {
+        if (argument == L"--brand" || argument == L"--receiver" || argument == L"--log" ||
+            argument == L"--layout") {
             if (!hasValue) return Fail(error, argument + L" needs a value");
             const std::wstring& value = arguments[++i];
             if (argument == L"--receiver") options.receivers.push_back(value);
             else if (argument == L"--log") options.log = value;
+            else if (argument == L"--layout") options.layout = value;
             else if (!SetBrand(value, options)) return Fail(error, L"unknown brand \"" + value + L"\"");
         } else if (argument == L"--all") {
             options.all = true;
@@ -39,6 +42,10 @@ bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions&
             options.dryRun = true;
         } else if (argument == L"--watch") {
             options.watch = true;
+        } else if (argument == L"--move") {
+            options.move = true;
+        } else if (argument == L"--no-notify") {
+            options.notify = false;
         } else if (argument.size() > 1 && argument[0] == L'-') {
             return Fail(error, L"unknown option " + argument);
         } else if (!options.target.empty()) {

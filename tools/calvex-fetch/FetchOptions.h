@@ -10,6 +10,9 @@ struct FetchOptions {
     bool all = false;      // fetch again what is already there
     bool dryRun = false;
     bool watch = false;    // keep running and fetch what receivers bring, as it comes
+    bool move = false;     // delete each file on the receiver once its copy is proven whole
+    std::wstring layout = L"{receiver}";  // where each file goes below the target
+    bool notify = true;    // the windowless watch's notification area icon and notices
     std::wstring log;      // the log file; empty: none (the windowless build has a default)
     std::wstring target;   // as given; made absolute by the caller
 };
