@@ -28,6 +28,23 @@ DWORD ReadType(const void* item) {
     return type;
 }
 
+const UINT kNoLevel = 0xFFFFFFFF;
+
+// The level an item of this kind stands at; kinds never made stand at none.
+UINT LevelOf(DWORD type) {
+    if (IsRootType(type)) return LevelRoot;
+    if (IsReceiverType(type)) return LevelReceiver;
+    return IsFileType(type) ? LevelFile : kNoLevel;
+}
+
+// True when a zero unit ends the name before the item does.
+bool HasTerminatedName(const BYTE* item, USHORT cb) {
+    for (size_t at = kNameOffset; at + sizeof(WCHAR) <= cb; at += sizeof(WCHAR)) {
+        if (item[at] == 0 && item[at + 1] == 0) return true;
+    }
+    return false;
+}
+
 DWORD RootType(DWORD brand) { return brand == BrandBrennor ? ItemTypeBrennorRoot : ItemTypeCalvexRoot; }
 DWORD ReceiverType(DWORD brand) {
     return brand == BrandBrennor ? ItemTypeBrennorReceiver : ItemTypeCalvexReceiver;
@@ -218,6 +235,22 @@ ReceiverItemData* CReceiversPidlMgr::GetData(LPCITEMIDLIST item) const {
 DWORD CReceiversPidlMgr::GetLastItemType(LPCITEMIDLIST list) const {
     LPCITEMIDLIST last = GetLastItem(list);
     return last ? ReadType(last) : 0;
+}
+
+PidlCheck CReceiversPidlMgr::Check(LPCITEMIDLIST list, ItemLevel firstLevel) const {
+    PidlCheck check;
+    const BYTE* item = reinterpret_cast<const BYTE*>(list);
+    for (UINT level = firstLevel; item; ++level, ++check.item) {
+        const USHORT cb = ReadCb(item);
+        if (cb == 0) return check;
+        if (cb < kNameOffset + sizeof(WCHAR)) return check.fault = PidlFault::ByteCount, check.value = cb, check;
+        // Nothing stands below a file, so at most three items are ever walked.
+        const DWORD type = ReadType(item);
+        if (LevelOf(type) != level) return check.fault = PidlFault::Kind, check.value = type, check;
+        if (!HasTerminatedName(item, cb)) return check.fault = PidlFault::Name, check;
+        item += cb;
+    }
+    return check;
 }
 
 std::wstring CReceiversPidlMgr::GetItemName(LPCITEMIDLIST item) const {

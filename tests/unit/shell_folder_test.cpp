@@ -11,6 +11,8 @@
 #include "folder/CCalvexReceiversShellFolder.h"
 #include "module/ClassIds.h"
 #include "module/ModuleApp.h"
+#include "raw_pidls.h"
+#include "transfer/CCalvexReceiversDataObject.h"
 #include "support/TestSupport.h"
 
 namespace {
@@ -48,24 +50,23 @@ protected:
 }  // namespace
 
 TEST_F(ShellFolderTest, GetAttributesOfReplacesTheMaskWithWhatAllItemsShare) {
-    UniquePidl brennorItem = Item(4, kKey), rootItem = Item(1, L"R");
-    struct { std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
-        {{}, 0xFFFFFFFF},
-        {{file.Get()}, 0x02000001},
-        {{receiverItem.Get()}, 0x22000000},
-        {{brennorItem.Get(), receiverItem.Get()}, 0x22000000},
-        {{rootItem.Get()}, 0xA2000000},
-        {{receiverItem.Get(), file.Get()}, 0x02000000},
+    UniquePidl brennorItem = Item(4, kKey), receiverFile(mgr, mgr.Concatenate(receiverItem.Get(), file.Get()));
+    struct { IShellFolder* folder; std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
+        {root.Get(), {}, 0xFFFFFFFF},
+        {receiver.Get(), {file.Get()}, 0x02000001},
+        {root.Get(), {receiverItem.Get()}, 0x22000000},
+        {root.Get(), {brennorItem.Get(), receiverItem.Get()}, 0x22000000},
+        {root.Get(), {receiverItem.Get(), receiverFile.Get()}, 0x02000000},  // a receiver and a file below one
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.items.size());
         SFGAOF attributes = SFGAO_CANDELETE | SFGAO_CANMOVE;  // asked for, and ignored
-        EXPECT_EQ(S_OK, root->GetAttributesOf(static_cast<UINT>(c.items.size()),
-                                              const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
+        EXPECT_EQ(S_OK, c.folder->GetAttributesOf(static_cast<UINT>(c.items.size()),
+                                                  const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
         EXPECT_EQ(c.expected, attributes);
     }
     LPCITEMIDLIST one[] = {file.Get()};
-    EXPECT_EQ(S_FALSE, root->GetAttributesOf(1, one, nullptr));
+    EXPECT_EQ(S_FALSE, receiver->GetAttributesOf(1, one, nullptr));
     EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::GetAttributesOf - attributes is collected [33554432]\r\n"));
 }
 
@@ -73,22 +74,23 @@ TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
     UniquePidl big = Item(6, L"B.qpr", 10, 40000.5), small = Item(6, L"A.qpr", 3, 40000.5);
     UniquePidl later = Item(6, L"C.qpr", 3, 40001.0), huge = Item(6, L"H.qpr", 0x80000000u, 0);
     UniquePidl one = Item(6, L"O.qpr", 1, 0), receiverA = Item(3, L"ABC!m!p"), receiverB = Item(3, L"abd!m!p");
-    UniquePidl receiverA2 = Item(3, L"abc!M!P");
-    struct { LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
-        {2, big.Get(), small.Get(), 14},                 // 7 * 2
-        {-2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
-        {2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
-        {3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
-        {3, small.Get(), big.Get(), 3},                  // ... in both orders
-        {3, big.Get(), later.Get(), -3},
-        {3, later.Get(), big.Get(), 3},
-        {2, receiverA.Get(), receiverB.Get(), 0},        // size and time only for files
-        {0, receiverA.Get(), big.Get(), 0},              // different kinds
-        {0, receiverA.Get(), receiverA2.Get(), 0},       // names ignore case
+    UniquePidl receiverA2 = Item(3, L"abc!M!P"), brennorA = Item(4, L"ABC!m!p");
+    IShellFolder* files = receiver.Get();
+    struct { IShellFolder* folder; LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
+        {files, 2, big.Get(), small.Get(), 14},                 // 7 * 2
+        {files, -2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
+        {files, 2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
+        {files, 3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
+        {files, 3, small.Get(), big.Get(), 3},                  // ... in both orders
+        {files, 3, big.Get(), later.Get(), -3},
+        {files, 3, later.Get(), big.Get(), 3},
+        {root.Get(), 2, receiverA.Get(), receiverB.Get(), 0},   // size and time only for files
+        {root.Get(), 0, receiverA.Get(), brennorA.Get(), 0},    // different kinds
+        {root.Get(), 0, receiverA.Get(), receiverA2.Get(), 0},  // names ignore case
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
-        EXPECT_EQ(c.expected, root->CompareIDs(c.lParam, c.first, c.second));
+        EXPECT_EQ(c.expected, c.folder->CompareIDs(c.lParam, c.first, c.second));
     }
     // Names: the sign of _wcsicmp, multiplied out.
     const HRESULT ascending = root->CompareIDs(0, receiverA.Get(), receiverB.Get());
@@ -160,7 +162,7 @@ TEST_F(ShellFolderTest, BothBrandsReportTheCalvexClass) {
 }
 
 TEST_F(ShellFolderTest, RefusedOperations) {
-    CCalvexReceiversShellFolder* folder = root.Get();
+    CCalvexReceiversShellFolder* folder = receiver.Get();
     LPCITEMIDLIST items[] = {file.Get(), file.Get()};
     void* object = reinterpret_cast<void*>(1);
     struct { HRESULT result; HRESULT expected; const char* trace; } cases[] = {
@@ -205,4 +207,87 @@ TEST_F(ShellFolderTest, ItemObjectsAndPathsDescribeTheAbsoluteItem) {
     CoTaskMemFree(tip);
     DWORD infoFlags = 0;
     EXPECT_EQ(E_NOTIMPL, info->GetInfoFlags(&infoFlags));
+}
+
+// Identifiers from shortcuts, saved views or the clipboard may be damaged: each is refused
+// with its reason in the trace, and nothing past its end is read (the byte after it faults).
+TEST_F(ShellFolderTest, DamagedIdentifiersAreRefusedBeforeTheyAreRead) {
+    using rawpidl::Whole;
+    const std::wstring wrapped(32754, L'w');  // (n + 1) * 2 + 27 is 65537: the count says 1
+    enum Call { Attributes, Compare, Name, Data, Icon, Bind };
+    const char* methods[] = {"GetAttributesOf", "CompareIDs", "GetDisplayNameOf", "GetUIObjectOf", "GetUIObjectOf", "BindToObject"};
+    IShellFolder *files = receiver.Get(), *top = root.Get();
+    struct { IShellFolder* folder; std::vector<rawpidl::RawItem> items; Call call; const char* reason; } rows[] = {
+        {files, {{17, 6, L"F"}}, Attributes, "item [0] counts [17] bytes, fewer than its fixed fields"},
+        {top, {Whole(3, kKey), {1, 6, L""}}, Name, "item [1] counts [1] bytes, fewer than its fixed fields"},
+        {files, {{19, 6, L""}}, Compare, "item [0] counts [19] bytes, fewer than its fixed fields"},
+        {files, {{40, 6, L"ABCDEFGHIJK", false}}, Compare, "item [0] has no name terminator inside it"},
+        {files, {{1, 6, wrapped}}, Data, "item [0] counts [1] bytes, fewer than its fixed fields"},
+        {files, {{21, 6, wrapped}}, Compare, "item [0] has no name terminator inside it"},  // 32,764 units
+        {top, {Whole(1, L"Calvex Receivers")}, Attributes, "item [0] is of kind [1], not held at this level"},
+        {files, {Whole(4, kKey)}, Name, "item [0] is of kind [4], not held at this level"},
+        {top, {Whole(5, kKey)}, Icon, "item [0] is of kind [5], not held at this level"},
+        {top, {Whole(6, L"F.qpr")}, Bind, "item [0] is of kind [6], not held at this level"},
+        {top, {Whole(3, kKey), Whole(6, L"F"), Whole(6, L"G")}, Bind, "item [2] is of kind [6], not held at this level"},
+        {files, {Whole(6, L"F"), Whole(3, kKey)}, Attributes, "item [1] is of kind [3], not held at this level"},
+    };
+    UniquePidl whole = Item(6, L"W.qpr", 5, 40000);
+    for (const auto& row : rows) {
+        rawpidl::Guarded damaged(rawpidl::Bytes(row.items));
+        SCOPED_TRACE(testing::Message() << row.reason << ": " << damaged.Hex());
+        LPCITEMIDLIST list[] = {damaged.Get()};
+        void* object = reinterpret_cast<void*>(1);
+        SFGAOF attributes = SFGAO_CANCOPY;
+        STRRET name = {};
+        switch (row.call) {
+        case Attributes:
+            EXPECT_EQ(E_INVALIDARG, row.folder->GetAttributesOf(1, list, &attributes));
+            EXPECT_EQ(0u, attributes);
+            break;
+        case Compare:  // after every whole item in every column, equal to another damaged one
+            for (LPARAM column : {0, 2, 3, -2, -3}) {
+                EXPECT_EQ(1, row.folder->CompareIDs(column, damaged.Get(), whole.Get())) << column;
+                EXPECT_EQ(-1, row.folder->CompareIDs(column, whole.Get(), damaged.Get())) << column;
+                EXPECT_EQ(0, row.folder->CompareIDs(column, damaged.Get(), damaged.Get())) << column;
+            }
+            break;
+        case Name: EXPECT_EQ(E_INVALIDARG, row.folder->GetDisplayNameOf(damaged.Get(), SHGDN_FORPARSING, &name)); break;
+        case Data: EXPECT_EQ(E_INVALIDARG, row.folder->GetUIObjectOf(nullptr, 1, list, IID_IDataObject, nullptr, &object)); break;
+        case Icon: EXPECT_EQ(E_INVALIDARG, row.folder->GetUIObjectOf(nullptr, 1, list, IID_IExtractIconW, nullptr, &object)); break;
+        case Bind: EXPECT_EQ(E_INVALIDARG, row.folder->BindToObject(damaged.Get(), nullptr, IID_IShellFolder, &object)); break;
+        }
+        if (row.call == Data || row.call == Icon || row.call == Bind) { EXPECT_EQ(nullptr, object); }
+        EXPECT_TRUE(testsupport::TraceContains(std::string("IReceiversShellFolderImpl::") + methods[row.call] +
+                                               " - malformed item identifier: " + row.reason + "\r\n"));
+    }
+}
+
+// Explorer reads the children of a "Shell IDList Array" back into the folder; one damaged on
+// the way is refused there, and Initialize never reads the absolute list it is handed.
+TEST_F(ShellFolderTest, DamagedIdentifiersReadBackFromTheClipboardOrGivenToInitialize) {
+    UniquePidl absolute(mgr, mgr.CreateFromPath((std::wstring(L"Calvex Receivers\\") + kKey + L"\\F.qpr").c_str(), 1));
+    ComPtr<ComObject<CCalvexReceiversDataObject>> data;
+    ASSERT_EQ(S_OK, CreateComObject<CCalvexReceiversDataObject>(&data));
+    ASSERT_EQ(S_OK, data->AddPidl(absolute.Get(), nullptr));
+    FORMATETC format = {static_cast<CLIPFORMAT>(RegisterClipboardFormatW(CFSTR_SHELLIDLIST)), nullptr, DVASPECT_CONTENT, -1, TYMED_HGLOBAL};
+    STGMEDIUM medium = {};
+    ASSERT_EQ(S_OK, data->GetData(&format, &medium));
+    const auto* cida = static_cast<const CIDA*>(GlobalLock(medium.hGlobal));
+    const BYTE* child = reinterpret_cast<const BYTE*>(cida) + cida->aoffset[1];
+    std::vector<BYTE> bytes(child, child + mgr.GetSize(reinterpret_cast<LPCITEMIDLIST>(child)));
+    GlobalUnlock(medium.hGlobal);
+    ReleaseStgMedium(&medium);
+    LPCITEMIDLIST readBack[] = {nullptr};
+    SFGAOF attributes = 0;
+    for (USHORT cb : {USHORT(bytes[0]), USHORT(9)}) {  // as written, then with its count damaged
+        bytes[0] = static_cast<BYTE>(cb);
+        rawpidl::Guarded guarded(bytes);
+        readBack[0] = guarded.Get();
+        EXPECT_EQ(cb == 9 ? E_INVALIDARG : S_OK, receiver->GetAttributesOf(1, readBack, &attributes)) << cb;
+        EXPECT_EQ(cb == 9 ? 0u : 0x02000001u, attributes);
+    }
+    rawpidl::Guarded damaged(rawpidl::Bytes({{5, 1, L""}}));
+    auto fresh = MakeFolder<CCalvexReceiversShellFolder>();
+    EXPECT_EQ(S_OK, fresh->Initialize(damaged.Get()));
+    EXPECT_EQ(fresh->GetFullPath(), std::wstring(L"::{20D04FE0-3AEA-1069-A2D8-08002B30309D}\\") + kCalvexRoot);
 }
