@@ -48,6 +48,8 @@ TEST(WatchNoticeTest, SaysWhatEachPassProved) {
          L"Q9 GNSS@USB: no files in D:\\Survey, 1 failed. Unplugged before the end: the rest comes when it is plugged in again."},
     };
     for (const Row& row : rows) EXPECT_EQ(row.notice, PassNotice(row.pass)) << row.what;
+    EXPECT_EQ(L"Q9 GNSS@USB: 11 files in D:\\Survey, 1 failed. \nUnplug only after it is fetched. ",
+              PassBalloon(Pass(11, 0, 0, 1)));
 }
 
 TEST(WatchNoticeTest, TooltipsSayWhatTheWatchDoes) {

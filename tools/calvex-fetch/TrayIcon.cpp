@@ -74,12 +74,12 @@ void TrayIcon::SetTip(const std::wstring& tip) {
     if (!m_added || !Shell_NotifyIconW(NIM_MODIFY, &data)) Add();
 }
 
-void TrayIcon::Notify(const std::wstring& title, const std::wstring& text, bool warning) {
+// Without a title: Wine's balloon, given one, cuts the text's last line in half.
+void TrayIcon::Notify(const std::wstring& text, bool warning) {
     if (!m_window) return;
     if (!m_added) Add();
     NOTIFYICONDATAW data = Data(NIF_INFO);
     Put(data.szInfo, text);
-    Put(data.szInfoTitle, title);
     data.uTimeout = kBalloonMs;
     data.dwInfoFlags = (warning ? NIIF_WARNING : NIIF_INFO) | NIIF_RESPECT_QUIET_TIME;
     if (m_added) Shell_NotifyIconW(NIM_MODIFY, &data);

@@ -17,7 +17,7 @@ public:
     TrayIcon& operator=(const TrayIcon&) = delete;
 
     void SetTip(const std::wstring& tip);
-    void Notify(const std::wstring& title, const std::wstring& text, bool warning);
+    void Notify(const std::wstring& text, bool warning);
 
 private:
     static LRESULT CALLBACK WindowProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam);

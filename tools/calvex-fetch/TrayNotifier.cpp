@@ -23,7 +23,7 @@ void TrayNotifier::PassEnded(const ReceiverPass& pass) {
     const std::wstring notice = PassNotice(pass);
     if (!IsNews(pass, notice)) return;
     m_console.Line(notice);
-    if (m_icon) m_icon->Notify(L"calvex-fetch", notice, pass.failed || pass.unplugged);
+    if (m_icon) m_icon->Notify(PassBalloon(pass), pass.failed || pass.unplugged);
 }
 
 bool TrayNotifier::IsNews(const ReceiverPass& pass, const std::wstring& notice) {

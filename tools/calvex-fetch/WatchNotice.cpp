@@ -32,6 +32,12 @@ std::wstring Advice(const ReceiverPass& pass) {
 
 std::wstring PassNotice(const ReceiverPass& pass) { return pass.receiver + L": " + Counts(pass) + L". " + Advice(pass); }
 
+// Each line ends in a space: Wine's balloon measures its text one character short and would cut
+// the last one off (Windows does not show it).
+std::wstring PassBalloon(const ReceiverPass& pass) {
+    return pass.receiver + L": " + Counts(pass) + L". \n" + Advice(pass) + L" ";
+}
+
 std::wstring IdleTip(const std::wstring& target) { return L"calvex-fetch: watching " + target; }
 
 std::wstring WorkingTip(const std::wstring& receiver, int left) {

@@ -12,6 +12,8 @@ constexpr size_t kNoticeLimit = 255;
 
 // "Q9 GNSS@USB: 12 files in D:\Survey, 12 deleted from the receiver. Safe to unplug."
 std::wstring PassNotice(const ReceiverPass& pass);
+// The same in a balloon: what is where on one line, the advice on the next.
+std::wstring PassBalloon(const ReceiverPass& pass);
 // "calvex-fetch: watching D:\Survey"
 std::wstring IdleTip(const std::wstring& target);
 // "calvex-fetch: Q9 GNSS@USB, 5 files left"
