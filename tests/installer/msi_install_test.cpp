@@ -52,8 +52,7 @@ void ExpectSamplesInstalled() {
 
 enum State { kNothing, kExtension, kExtensionAndSimulator };
 
-// What the logon start of the automatic download runs, for the folder and the options (moving,
-// the layout) the install was given.
+// What the logon start of the automatic download runs, for the folder and options the install was given.
 std::wstring RunCommand(const wchar_t* fetchDir, const wchar_t* options) {
     if (!fetchDir) return L"<none>";
     wchar_t documents[MAX_PATH] = L"";
@@ -62,7 +61,7 @@ std::wstring RunCommand(const wchar_t* fetchDir, const wchar_t* options) {
     return L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --watch" + options + L" \"" + folder + L"\"";
 }
 
-void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options) {
+void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options = L"") {
     EXPECT_EQ(RunCommand(fetchDir, options), RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
     EXPECT_EQ(state != kNothing, FileExists(InstallDir() + L"\\calvex-fetchw.exe"));
     const std::wstring dll = InstallDir() + L"\\CalvexReceiversShellExt.dll";
@@ -86,31 +85,29 @@ void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options) {
 }  // namespace
 
 TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
-    ExpectState(kNothing, nullptr, L"");
-    const wchar_t byDate[] = L" --move --layout \"{receiver}\\{yyyy}\\{doy}\"";
-    const wchar_t repair[] = L"/i REINSTALL=ALL REINSTALLMODE=omus";  // every component written again
+    ExpectState(kNothing, nullptr);
     // fetchDir: the folder the logon start watches ("" the default), null when there is none;
-    // options: what it is given besides.
-    struct Step { const char* what; std::wstring arguments; State after; const wchar_t* fetchDir; const wchar_t* options; bool mayBeUnknown; } steps[] = {
-        {"install everything, moving and filing by date",
-         L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\" FETCHMOVE=1 FETCHLAYOUT=\"{receiver}\\{yyyy}\\{doy}\"",
-         kExtensionAndSimulator, L"C:\\Survey data", byDate, false},
-        {"install again, the folder and options remembered", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, L"C:\\Survey data", byDate, false},
-        {"repair, the folder and options remembered", repair, kExtensionAndSimulator, L"C:\\Survey data", byDate, false},
-        {"repair, moving turned off", std::wstring(repair) + L" FETCHMOVE=0", kExtensionAndSimulator, L"C:\\Survey data",
-         L" --layout \"{receiver}\\{yyyy}\\{doy}\"", false},
-        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, L"", false},
-        {"uninstall", L"/x", kNothing, nullptr, L"", false},
-        {"uninstall again", L"/x", kNothing, nullptr, L"", true},  // Windows answers an unknown product
-        {"install the default features", L"/i", kExtension, nullptr, L"", false},
-        {"uninstall", L"/x", kNothing, nullptr, L"", false},
-        {"install the automatic download alone, nothing remembered", L"/i ADDLOCAL=AutoFetch", kExtension, L"", L"", false},
-        {"uninstall", L"/x", kNothing, nullptr, L"", false},
+    // options: moving and the layout, kept by a repair (every component written again).
+    const wchar_t byDate[] = L" --move --layout \"{receiver}\\{yyyy}\\{doy}\"";
+    struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; const wchar_t* options = L""; } steps[] = {
+        {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\" FETCHMOVE=1 FETCHLAYOUT=\"{receiver}\\{yyyy}\\{doy}\"",
+         kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"install again, the folder remembered", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"repair", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"repair, moving off", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHMOVE=0", kExtensionAndSimulator, L"C:\\Survey data",
+         false, byDate + 7},
+        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
+        {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product
+        {"install the default features", L"/i", kExtension, nullptr, false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
+        {"install the automatic download alone", L"/i ADDLOCAL=AutoFetch", kExtension, L"", false},
+        {"uninstall", L"/x", kNothing, nullptr, false},
     };
     const std::wstring msi = L" \"" + BuildDir() + L"\\CalvexReceiversShellExt.msi\" /qn";
     for (const Step& step : steps) {
         SCOPED_TRACE(step.what);
-        const std::wstring& arguments = step.arguments;  // the action, then properties after the package
+        const std::wstring arguments = step.arguments;  // the action, then properties after the package
         const DWORD exitCode = RunProcess(L"msiexec.exe " + arguments.substr(0, 2) + msi + arguments.substr(2), 300000);
         EXPECT_TRUE(exitCode == 0 || (step.mayBeUnknown && exitCode == ERROR_UNKNOWN_PRODUCT)) << exitCode;
         ExpectState(step.after, step.fetchDir, step.options);
