@@ -11,14 +11,8 @@ using namespace testsupport;
 namespace {
 ReceiverPass Pass(int files, int deleted = 0, int kept = 0, int failed = 0, const wchar_t* first = L"", bool unplugged = false) {
     ReceiverPass pass;
-    pass.receiver = L"Q9 GNSS@USB";
-    pass.target = L"D:\\Survey";
-    pass.files = pass.fetched = files;
-    pass.deleted = deleted;
-    pass.kept = kept;
-    pass.failed = failed;
-    pass.firstFailure = first;
-    pass.unplugged = unplugged;
+    pass.receiver = L"Q9 GNSS@USB", pass.target = L"D:\\Survey", pass.files = pass.fetched = files;
+    pass.deleted = deleted, pass.kept = kept, pass.failed = failed, pass.firstFailure = first, pass.unplugged = unplugged;
     return pass;
 }
 }  // namespace
