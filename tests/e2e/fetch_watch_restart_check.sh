@@ -3,9 +3,12 @@
 # logon, started before the device manager is installed and through a restart of it. Files
 # logged while it is away come once it is back; a second watch and a batch run into the same
 # folder are refused while the first runs on; no download dialog comes on the screen; the end
-# of the session stops it during a download without leaving a partial file.
+# of the session stops it during a download without leaving a partial file. It has an icon in
+# the notification area and logs a notice after each receiver's pass; with --no-notify it logs
+# the notices and shows no icon.
 # Guards against a watch that ends for good without the device manager, files fetched twice by
-# racing tools, a log without its lines, and a logoff that leaves half a file.
+# racing tools, a log without its lines, a logoff that leaves half a file, a watch that says
+# nothing when a receiver is done, and an icon that --no-notify does not take away.
 set -u
 build=$1
 run="$build/wine-run"
@@ -17,6 +20,8 @@ mkdir -p "$root" "$target"
 source "$(dirname "$0")/lib.sh"
 fail=0
 stamp=1795000000
+# Wine's stand-alone notification area: a window of its own, shown while it holds an icon.
+tray() { xdotool search --onlyvisible --name '^Wine System Tray$' 2>/dev/null | grep -q .; }
 
 receiver "$root/Calvex A" 1 1000-0001 A
 log "$root/Calvex A" LOG0001 3000
@@ -34,6 +39,9 @@ waitfor "$wlog" "no device manager yet (0x80040154)" 15
 waitfor "$wlog" "the device manager is back: every receiver is compared in full" 30
 waitfor "$wlog" "fetched     A@USB\\LOG0001" 60
 waitfor "$wlog" "fetched     C@USB\\LOG0001" 30
+waitfor "$wlog" "A@USB: 1 file in $(win "$target"). Safe to unplug." 30
+waitfor "$wlog" "C@USB: 1 file in $(win "$target"). Safe to unplug." 30
+tray || bad "no icon in the notification area while the watch runs"
 
 # One at a time: a second watch (logging to the target's own calvex-fetch.log, the windowless
 # default) and a batch run into the same folder, spelt otherwise, are refused; the first runs on.
@@ -80,12 +88,22 @@ waitfor "$wlog" "discarded   A@USB\\BIG0001.qpr (stopped)" 1
 grep -q "^[0-9:]* watch ended: .* (stopped)$" <(tr -d '\r' <"$wlog") || bad "no summary"
 grep -vE '^(---- [0-9-]+ ----)?$' <(tr -d '\r' <"$wlog") | grep -qvE '^[0-2][0-9]:[0-5][0-9]:[0-5][0-9] ' &&
   bad "a log line without its time"
-"$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Root /f >/dev/null 2>&1
 tr -d '\r' <"$wlog"
 
 # Every file but the one cut off, once, whole, with its time; nothing partial.
 rm "$root/Calvex A/BIG0001"
 landed "$wlog"
+
+# --no-notify: the same notices in the log, no icon.
+tray && bad "an icon is left in the notification area after the watch ended"
+quiet=$work/quiet.log
+"$run" "$build/calvex-fetchw.exe" --watch --no-notify --log "$(win "$quiet")" "$(win "$target")" >/dev/null 2>&1 &
+tool=$!
+waitfor "$quiet" "A@USB: 2 files in $(win "$target"). Safe to unplug." 60
+tray && bad "an icon in the notification area with --no-notify"
+"$run" wineboot --end-session
+ends $tool 20 >/dev/null
+"$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Root /f >/dev/null 2>&1
 rm -rf "$work"
-[ $fail -eq 0 ] && echo "PASS: through a restart of the device manager, one watch per folder, a clean end of session"
+[ $fail -eq 0 ] && echo "PASS: through a restart of the device manager, one watch per folder, a clean end of session, a notice per receiver, an icon unless --no-notify"
 exit $fail

@@ -52,17 +52,17 @@ void ExpectSamplesInstalled() {
 
 enum State { kNothing, kExtension, kExtensionAndSimulator };
 
-// What the logon start of the automatic download runs, for the folder the install was given.
-std::wstring RunCommand(const wchar_t* fetchDir) {
+// What the logon start of the automatic download runs, for the folder and options the install was given.
+std::wstring RunCommand(const wchar_t* fetchDir, const wchar_t* options) {
     if (!fetchDir) return L"<none>";
     wchar_t documents[MAX_PATH] = L"";
     SHGetFolderPathW(nullptr, CSIDL_PERSONAL, nullptr, SHGFP_TYPE_CURRENT, documents);
     const std::wstring folder = *fetchDir ? fetchDir : std::wstring(documents) + L"\\Survey";
-    return L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --watch \"" + folder + L"\"";
+    return L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --watch" + options + L" \"" + folder + L"\"";
 }
 
-void ExpectState(State state, const wchar_t* fetchDir) {
-    EXPECT_EQ(RunCommand(fetchDir), RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
+void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options = L"") {
+    EXPECT_EQ(RunCommand(fetchDir, options), RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
     EXPECT_EQ(state != kNothing, FileExists(InstallDir() + L"\\calvex-fetchw.exe"));
     const std::wstring dll = InstallDir() + L"\\CalvexReceiversShellExt.dll";
     const std::wstring sim = InstallDir() + L"\\CalvexDeviceSim.exe";
@@ -86,10 +86,16 @@ void ExpectState(State state, const wchar_t* fetchDir) {
 
 TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
     ExpectState(kNothing, nullptr);
-    // fetchDir: the folder the logon start watches ("" the default), null when there is none.
-    struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; } steps[] = {
-        {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\"", kExtensionAndSimulator, L"C:\\Survey data", false},
-        {"install again, the folder remembered", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, L"C:\\Survey data", false},
+    // fetchDir: the folder the logon start watches ("" the default), null when there is none;
+    // options: moving and the layout, kept by a repair (every component written again).
+    const wchar_t byDate[] = L" --move --layout \"{receiver}\\{yyyy}\\{doy}\"";
+    struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; const wchar_t* options = L""; } steps[] = {
+        {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\" FETCHMOVE=1 FETCHLAYOUT=\"{receiver}\\{yyyy}\\{doy}\"",
+         kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"install again, the folder remembered", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"repair", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
+        {"repair, moving off", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHMOVE=0", kExtensionAndSimulator, L"C:\\Survey data",
+         false, byDate + 7},
         {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
         {"uninstall", L"/x", kNothing, nullptr, false},
         {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product
@@ -104,6 +110,6 @@ TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
         const std::wstring arguments = step.arguments;  // the action, then properties after the package
         const DWORD exitCode = RunProcess(L"msiexec.exe " + arguments.substr(0, 2) + msi + arguments.substr(2), 300000);
         EXPECT_TRUE(exitCode == 0 || (step.mayBeUnknown && exitCode == ERROR_UNKNOWN_PRODUCT)) << exitCode;
-        ExpectState(step.after, step.fetchDir);
+        ExpectState(step.after, step.fetchDir, step.options);
     }
 }

@@ -13,6 +13,7 @@
 #include <ole2.h>
 
 #include <atomic>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -28,6 +29,9 @@
 #include "SessionEndWindow.h"
 #include "ShellNamespace.h"
 #include "TargetLock.h"
+#include "TrayIcon.h"
+#include "TrayNotifier.h"
+#include "WatchNotice.h"
 
 namespace {
 const wchar_t kNoReceiver[] = L"no receiver is connected";
@@ -133,6 +137,28 @@ std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULO
            (g_interrupted ? L" (interrupted)" : L"");
 }
 
+// The watch tells the observer where it stands and how each receiver's pass ended. Until the
+// watch takes an observer (ReceiverWatch::SetObserver), it is told nothing.
+template <typename Watch>
+auto AttachObserver(Watch& watch, WatchObserver* observer, int) -> decltype(watch.SetObserver(observer), void()) {
+    watch.SetObserver(observer);
+}
+template <typename Watch>
+void AttachObserver(Watch&, WatchObserver*, long) {}
+
+// The windowless watch has an icon in the notification area unless told not to (--no-notify);
+// the console build has its console. Either way the notices are lines of the console and log.
+int Watch(const FetchOptions& options, const std::wstring& target, FetchConsole& console) {
+    std::unique_ptr<TrayIcon> icon;
+#ifdef CALVEX_WINDOWLESS
+    if (options.notify) icon.reset(new TrayIcon(IdleTip(target)));
+#endif
+    TrayNotifier notifier(console, target, icon.get());
+    ReceiverWatch watch(options, target, console, g_interrupted, g_stop);
+    AttachObserver(watch, &notifier, 0);
+    return watch.Run();
+}
+
 int Fetch(const FetchOptions& options, FetchConsole& console) {
     const std::wstring target = FullPath(options.target);
 #ifdef CALVEX_WINDOWLESS
@@ -152,7 +178,7 @@ int Fetch(const FetchOptions& options, FetchConsole& console) {
     }
     if (options.watch) {
         console.SetStamped(true);
-        return ReceiverWatch(options, target, console, g_interrupted, g_stop).Run();
+        return Watch(options, target, console);
     }
     std::vector<Receiver> receivers;
     const HRESULT hr = ListReceivers(options, receivers);

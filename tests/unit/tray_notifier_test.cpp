@@ -1,0 +1,44 @@
+// Guards which passes the watch speaks of, in its log: news of a receiver once, not the same words
+// at every full comparison, and again once a receiver comes back, after an unplug or a long absence.
+#include <gtest/gtest.h>
+
+#include "TrayNotifier.h"
+#include "WatchNotice.h"
+#include "support/TestSupport.h"
+
+using namespace testsupport;
+
+TEST(TrayNotifierTest, SpeaksOfNewsOnly) {
+    wchar_t folder[MAX_PATH];
+    GetTempPathW(MAX_PATH, folder);
+    const std::wstring log = std::wstring(folder) + L"tray_notifier_test.log";
+    DeleteFileW(log.c_str());
+    FetchConsole console;
+    console.SetLog(log);
+    ULONGLONG now = 1000000;
+    TrayNotifier notifier(console, L"C:\\Survey", nullptr, [&] { return now; });
+    struct Step { ULONGLONG after; const wchar_t* receiver; int files; bool unplugged, said; } steps[] = {
+        {0, L"Q9 GNSS@USB", 12, false, true},       // plugged in
+        {60000, L"Q9 GNSS@USB", 12, false, false},  // the full comparison a minute later
+        {5000, L"R2/Net@COM4", 2, false, true},     // another receiver
+        {5000, L"Q9 GNSS@USB", 13, false, true},    // a file logged
+        {60000, L"Q9 GNSS@USB", 13, false, false},
+        {95000, L"Q9 GNSS@USB", 13, false, true},   // not seen for longer than a comparison: replugged
+        {1000, L"Q9 GNSS@USB", 13, true, true},     // unplugged during a pass
+        {20000, L"Q9 GNSS@USB", 13, false, true},   // back: the same words are news again
+    };
+    std::string expected;
+    for (const Step& step : steps) {
+        ReceiverPass pass;
+        pass.receiver = step.receiver, pass.target = L"C:\\Survey", pass.files = step.files, pass.unplugged = step.unplugged;
+        now += step.after;
+        notifier.PassEnded(pass);
+        if (step.said) expected += Narrow(PassNotice(pass)) + "\r\n";
+    }
+    std::string logged = ReadFileBytes(log);  // less the day's line and each line's time
+    logged.erase(0, logged.find("\r\n") + 2);
+    for (size_t line = 0; line < logged.size() && line != std::string::npos + 2; line = logged.find("\r\n", line) + 2)
+        logged.erase(line, 9);
+    EXPECT_EQ(expected, logged);
+    DeleteFileW(log.c_str());
+}
