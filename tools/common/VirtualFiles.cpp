@@ -63,7 +63,7 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     }
     ULONGLONG written = 0;
     HRESULT hr = CopyStream(stream, file, written);
-    const ULONGLONG expected = (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+    const ULONGLONG expected = DescriptorSize(descriptor);
     const FILETIME time = DescriptorWriteTime(descriptor);
     if (FAILED(hr)) {
         error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
@@ -72,6 +72,10 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
         hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
     } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &time)) {
         error = ErrorText(L"cannot set the write time", GetLastError());
+        hr = HRESULT_FROM_WIN32(GetLastError());
+    } else if (!FlushFileBuffers(file)) {
+        // On the disk before it gets its final name: a power cut leaves no short file there.
+        error = ErrorText(L"cannot flush the file to the disk", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
     CloseHandle(file);
@@ -98,6 +102,20 @@ FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor) {
     if (FileTimeToSystemTime(&descriptor.ftLastWriteTime, &local) && TzSpecificLocalTimeToSystemTime(nullptr, &local, &universal))
         SystemTimeToFileTime(&universal, &moment);
     return moment;
+}
+
+ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
+    return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+}
+
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
+    WIN32_FILE_ATTRIBUTE_DATA found = {};
+    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &found)) return false;
+    if (found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) return false;
+    const ULONGLONG size = (static_cast<ULONGLONG>(found.nFileSizeHigh) << 32) | found.nFileSizeLow;
+    const FILETIME time = DescriptorWriteTime(descriptor);
+    if ((descriptor.dwFlags & FD_FILESIZE) && size != DescriptorSize(descriptor)) return false;
+    return !(descriptor.dwFlags & FD_WRITESTIME) || CompareFileTime(&found.ftLastWriteTime, &time) == 0;
 }
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
@@ -154,11 +172,18 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
     }
     const std::wstring temporary = path + kPartialSuffix;
     HRESULT hr = WriteTemporary(temporary, descriptor, stream, error);
-    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING)) {
+    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
-    if (FAILED(hr)) DeleteFileW(temporary.c_str());
+    if (FAILED(hr)) {
+        DeleteFileW(temporary.c_str());
+    } else if (!IsOnDiskAsDescribed(path, descriptor)) {
+        // Read back under its final name: what is not as described does not stay there.
+        DeleteFileW(path.c_str());
+        error = L"the file on the disk is not as described after the rename";
+        hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
+    }
     return hr;
 }
 
