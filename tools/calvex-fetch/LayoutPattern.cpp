@@ -111,18 +111,23 @@ bool LayoutPattern::Value(const Piece& piece, const LayoutReceiver& receiver, co
     return true;
 }
 
-SafeName LayoutPattern::Folder(const LayoutReceiver& receiver, const SYSTEMTIME& logged, size_t targetLength) const {
-    std::wstring joined;
+bool LayoutPattern::Expand(const LayoutReceiver& receiver, const SYSTEMTIME* logged, std::wstring& joined,
+                           SafeName& refusal) const {
     for (const Component& component : m_components) {
         if (!joined.empty()) joined += L"\\";
         for (const Piece& piece : component) {
             std::wstring value;
-            SafeName refusal;
-            if (!Value(piece, receiver, &logged, value, refusal)) return refusal;
+            if (!Value(piece, receiver, logged, value, refusal)) return false;
             joined += value;
         }
     }
-    return MakeSafeDescriptorName(joined, targetLength);
+    return true;
+}
+
+SafeName LayoutPattern::Folder(const LayoutReceiver& receiver, const SYSTEMTIME& logged, size_t targetLength) const {
+    std::wstring joined;
+    SafeName refusal;
+    return Expand(receiver, &logged, joined, refusal) ? MakeSafeDescriptorName(joined, targetLength) : refusal;
 }
 
 SafeName LayoutPattern::Check(const LayoutReceiver& receiver, size_t targetLength) const {
@@ -132,14 +137,7 @@ SafeName LayoutPattern::Check(const LayoutReceiver& receiver, size_t targetLengt
 
 std::wstring LayoutPattern::Shown(const LayoutReceiver& receiver) const {
     std::wstring shown;
-    for (const Component& component : m_components) {
-        if (!shown.empty()) shown += L"\\";
-        for (const Piece& piece : component) {
-            std::wstring value;
-            SafeName refusal;
-            Value(piece, receiver, nullptr, value, refusal);
-            shown += value;
-        }
-    }
+    SafeName refusal;
+    Expand(receiver, nullptr, shown, refusal);  // a receiver refused is never shown
     return shown;
 }

@@ -41,6 +41,8 @@ private:
     };
     using Component = std::vector<Piece>;
 
+    // Every component's values joined by "\"; date fields as written without logged.
+    bool Expand(const LayoutReceiver& receiver, const SYSTEMTIME* logged, std::wstring& joined, SafeName& refusal) const;
     static bool ParseComponent(const std::wstring& text, Component& component, std::wstring& error);
     // A field's value; false when a receiver field makes no name (reason in refusal).
     static bool Value(const Piece& piece, const LayoutReceiver& receiver, const SYSTEMTIME* logged,
