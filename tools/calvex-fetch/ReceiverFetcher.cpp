@@ -79,13 +79,14 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item) {
     const SafeName safe = MakeSafeDescriptorName(name, targetDir.size());
     if (safe.refused) return Fail(name, L"refused name: " + safe.reason);
     const std::wstring shown = m_shownFolder + (safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")");
-    if (!m_options.all && IsAlreadyFetched(targetDir + L"\\" + safe.name, descriptor)) {
+    const std::wstring path = targetDir + L"\\" + safe.name;
+    if (!m_options.all && IsAlreadyFetched(path, descriptor)) {
         ++m_totals.skipped;
         if (m_options.move) return Remove(descriptor, shown, false);
         // A watch compares again at every event: only news is worth a line there.
         return m_watching ? void() : m_console.Line(L"  up to date  " + shown);
     }
-    if (!m_options.dryRun) return Fetch(data.Get(), descriptor, targetDir, shown);
+    if (!m_options.dryRun) return Fetch(data.Get(), descriptor, targetDir, path, shown);
     ++m_totals.fetched;
     m_totals.deleted += m_options.move ? 1 : 0;
     m_totals.bytes += DescriptorSize(descriptor);
@@ -94,7 +95,7 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item) {
 }
 
 void ReceiverFetcher::Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& targetDir,
-                            const std::wstring& shown) {
+                            const std::wstring& path, const std::wstring& shown) {
     const std::wstring name = descriptor.cFileName;
     std::wstring error;
     if (!Download(data, descriptor, name, targetDir, error)) {
@@ -104,8 +105,11 @@ void ReceiverFetcher::Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor
     }
     ++m_totals.fetched;
     m_totals.bytes += DescriptorSize(descriptor);
-    if (m_options.move) return Remove(descriptor, shown, true);
-    m_console.Line(L"  fetched     " + shown + L"  " + ByteText(DescriptorSize(descriptor)));
+    const std::wstring line = shown + L"  " + ByteText(DescriptorSize(descriptor));
+    if (!m_options.move) return m_console.Line(L"  fetched     " + line);
+    if (IsAlreadyFetched(path, descriptor)) return Remove(descriptor, shown, true);
+    ++m_totals.kept;  // whole, but the disk cannot hold the receiver's time: no proof for a delete
+    m_console.Line(L"  kept        " + line + L" (fetched; its time cannot be kept on this disk)");
 }
 
 bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& shownName,
@@ -129,7 +133,7 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
         error = hr == S_FALSE ? L"download failed or cancelled" : L"no contents (" + HexText(hr) + L")";
         return false;
     }
-    // S_OK: flushed, renamed with write-through and read back as described (VirtualFiles.h).
+    // S_OK: flushed, renamed with write-through, and read back in place (VirtualFiles.h).
     return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));
 }
 

@@ -53,7 +53,7 @@ private:
     // The file's folder below the target, by the layout; false when it makes no name.
     bool Place(const FILEDESCRIPTORW& descriptor, std::wstring& targetDir);
     void Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& targetDir,
-               const std::wstring& shown);
+               const std::wstring& path, const std::wstring& shown);
     // Downloads and writes one file; false with the reason.
     bool Download(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& shownName,
                   const std::wstring& targetDir, std::wstring& error);

@@ -54,8 +54,24 @@ HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written) {
     }
 }
 
+// A file's size and last-write time as the disk holds them.
+struct OnDisk {
+    ULONGLONG size = 0;
+    FILETIME time = {};
+};
+
+bool ReadOnDisk(const std::wstring& path, OnDisk& found) {
+    WIN32_FILE_ATTRIBUTE_DATA data = {};
+    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &data)) return false;
+    found.size = (static_cast<ULONGLONG>(data.nFileSizeHigh) << 32) | data.nFileSizeLow;
+    found.time = data.ftLastWriteTime;
+    return !(data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY);
+}
+
+// flushed: what the file holds once on the disk (a time the disk cannot hold, as 1601 on
+// Wine's, is not the descriptor's).
 HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descriptor, IStream* stream,
-                       std::wstring& error) {
+                       std::wstring& error, OnDisk& flushed) {
     HANDLE file = CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
     if (file == INVALID_HANDLE_VALUE) {
         error = ErrorText(L"cannot create the temporary file", GetLastError());
@@ -73,11 +89,12 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &time)) {
         error = ErrorText(L"cannot set the write time", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
-    } else if (!FlushFileBuffers(file)) {
+    } else if (!FlushFileBuffers(file) || !GetFileTime(file, nullptr, nullptr, &flushed.time)) {
         // On the disk before it gets its final name: a power cut leaves no short file there.
         error = ErrorText(L"cannot flush the file to the disk", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
+    flushed.size = written;
     CloseHandle(file);
     return hr;
 }
@@ -109,13 +126,11 @@ ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
 }
 
 bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
-    WIN32_FILE_ATTRIBUTE_DATA found = {};
-    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &found)) return false;
-    if (found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) return false;
-    const ULONGLONG size = (static_cast<ULONGLONG>(found.nFileSizeHigh) << 32) | found.nFileSizeLow;
+    OnDisk found;
+    if (!ReadOnDisk(path, found)) return false;
     const FILETIME time = DescriptorWriteTime(descriptor);
-    if ((descriptor.dwFlags & FD_FILESIZE) && size != DescriptorSize(descriptor)) return false;
-    return !(descriptor.dwFlags & FD_WRITESTIME) || CompareFileTime(&found.ftLastWriteTime, &time) == 0;
+    if ((descriptor.dwFlags & FD_FILESIZE) && found.size != DescriptorSize(descriptor)) return false;
+    return !(descriptor.dwFlags & FD_WRITESTIME) || CompareFileTime(&found.time, &time) == 0;
 }
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
@@ -171,17 +186,18 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
         return HRESULT_FROM_WIN32(GetLastError());
     }
     const std::wstring temporary = path + kPartialSuffix;
-    HRESULT hr = WriteTemporary(temporary, descriptor, stream, error);
+    OnDisk flushed, placed;
+    HRESULT hr = WriteTemporary(temporary, descriptor, stream, error, flushed);
     if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
     if (FAILED(hr)) {
         DeleteFileW(temporary.c_str());
-    } else if (!IsOnDiskAsDescribed(path, descriptor)) {
-        // Read back under its final name: what is not as described does not stay there.
+    } else if (!ReadOnDisk(path, placed) || placed.size != flushed.size || CompareFileTime(&placed.time, &flushed.time)) {
+        // Read back under its final name: what is not the file flushed does not stay there.
         DeleteFileW(path.c_str());
-        error = L"the file on the disk is not as described after the rename";
+        error = L"the file on the disk is not the one written after the rename";
         hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
     }
     return hr;

@@ -29,8 +29,10 @@ bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descri
 // Writes the stream's remaining bytes as target\name, the name made safe or refused by
 // MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the size is
 // checked against the descriptor, the write time set and the file flushed to the disk; it is
-// renamed with write-through and read back under its final name (IsOnDiskAsDescribed). S_OK
-// means the file is proven whole on the disk. Nothing is left behind on failure; error says why.
+// renamed with write-through and read back under its final name: S_OK means that the file
+// flushed is the one in place, whole. With IsOnDiskAsDescribed that proves a copy (a time
+// that the disk cannot hold is not the descriptor's). Nothing is left behind on failure;
+// error says why.
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
                          std::wstring& error);
 
