@@ -48,6 +48,8 @@ bool SimDownload::Next(ULONGLONG now, Event* event) {
         return true;
     }
     if (m_plan.failAtPercent >= 0 && Percent() >= m_plan.failAtPercent) return End(m_plan.failResult, event);
+    if (ChangeDue(m_plan.growAtPercent, Step::Grow, event) || ChangeDue(m_plan.retimeAtPercent, Step::Retime, event))
+        return true;
     if ((m_written > 0 || m_bytes.empty()) && Percent() != m_reported) {
         m_reported = Percent();  // an empty file reports its 100 here
         *event = Event{Step::Progress, Percent(), S_OK};
@@ -59,6 +61,13 @@ bool SimDownload::Next(ULONGLONG now, Event* event) {
         return End(SUCCEEDED(hr) ? S_OK : hr, event);
     }
     return WriteDue(now, event);
+}
+
+bool SimDownload::ChangeDue(long& atPercent, Step step, Event* event) {
+    if (atPercent < 0 || Percent() < atPercent) return false;
+    atPercent = -1;  // once
+    *event = Event{step, Percent(), S_OK};
+    return true;
 }
 
 bool SimDownload::WriteDue(ULONGLONG now, Event* event) {

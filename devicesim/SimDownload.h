@@ -12,7 +12,8 @@
 
 class SimDownload {
 public:
-    enum class Step { Begin, Progress, Finish, Exit };
+    // Grow and Retime: the tree's file is to change now (the bytes sent stay those read at the start).
+    enum class Step { Begin, Progress, Finish, Exit, Grow, Retime };
     struct Event {
         Step step = Step::Begin;
         BYTE percent = 0;
@@ -35,6 +36,7 @@ private:
     BYTE Percent() const;
     bool End(HRESULT result, Event* event);
     bool WriteDue(ULONGLONG now, Event* event);
+    bool ChangeDue(long& atPercent, Step step, Event* event);
 
     std::string m_bytes;
     ComPtr<IStream> m_stream;

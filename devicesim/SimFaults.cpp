@@ -71,6 +71,8 @@ bool SimFaults::SetTransfer(const std::wstring& key, long value, std::wstring* e
         {L"FailAtPercent", &m_failAtPercent, 0, 100},
         {L"FailResult", &m_failResult, -0x7FFFFFFF - 1, 0x7FFFFFFF},
         {L"ExitAtPercent", &m_exitAtPercent, 0, 100},
+        {L"GrowAtPercent", &m_growAtPercent, 0, 100},
+        {L"RetimeAtPercent", &m_retimeAtPercent, 0, 100},
     };
     for (const Named& named : settings) {
         if (!SameTextNoCase(key, named.name)) continue;
@@ -112,5 +114,7 @@ SimTransferPlan SimFaults::Plan(const SimFaults& receiver, const SimFaults& glob
     plan.failAtPercent = Pick(receiver.m_failAtPercent, global.m_failAtPercent, -1);
     plan.failResult = static_cast<HRESULT>(Pick(receiver.m_failResult, global.m_failResult, E_FAIL));
     plan.exitAtPercent = Pick(receiver.m_exitAtPercent, global.m_exitAtPercent, -1);
+    plan.growAtPercent = Pick(receiver.m_growAtPercent, global.m_growAtPercent, -1);
+    plan.retimeAtPercent = Pick(receiver.m_retimeAtPercent, global.m_retimeAtPercent, -1);
     return plan;
 }

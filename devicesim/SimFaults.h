@@ -13,6 +13,8 @@ struct SimTransferPlan {
     long failAtPercent = -1;      // -1: never
     HRESULT failResult = E_FAIL;
     long exitAtPercent = -1;      // -1: never
+    long growAtPercent = -1;      // the tree's file grows by a byte here, as one still logged; -1: never
+    long retimeAtPercent = -1;    // the tree's file is a minute newer here, as one rewritten; -1: never
 };
 
 class SimFaults {
@@ -23,7 +25,8 @@ public:
     // The server ends itself (as ExitAtPercent does) when this call is made; named as above.
     bool SetExitCall(const std::wstring& name, std::wstring* error);
     bool ExitsOn(const wchar_t* call, const std::wstring& target) const;
-    // One key of the transfer settings (Rate, FailAtPercent, FailResult, ExitAtPercent).
+    // One key of the transfer settings (Rate, FailAtPercent, FailResult, ExitAtPercent,
+    // GrowAtPercent, RetimeAtPercent).
     bool SetTransfer(const std::wstring& key, long value, std::wstring* error);
 
     // The failure set for call on target (a file name, or empty), the targeted entry first.
@@ -41,5 +44,5 @@ private:
     static bool Find(const CallMap& calls, const wchar_t* call, const std::wstring& target, HRESULT* result);
     CallMap m_calls;
     CallMap m_exits;
-    Setting m_rate, m_failAtPercent, m_failResult, m_exitAtPercent;
+    Setting m_rate, m_failAtPercent, m_failResult, m_exitAtPercent, m_growAtPercent, m_retimeAtPercent;
 };

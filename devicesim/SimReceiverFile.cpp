@@ -114,6 +114,10 @@ bool SimReceiverFile::Tick() {
                 m_download->SkipExit();
             continue;
         }
+        if (event.step == SimDownload::Step::Grow || event.step == SimDownload::Step::Retime) {
+            ChangeTreeFile(event.step == SimDownload::Step::Grow);
+            continue;
+        }
         if (event.step == SimDownload::Step::Finish) {
             m_download.reset();  // the handler may start the next download at once
             SimLog::Write(L"download of \"" + m_file->path + L"\" finished " + HexResult(event.result));
@@ -122,6 +126,28 @@ bool SimReceiverFile::Tick() {
         if (event.step == SimDownload::Step::Finish) break;
     }
     return m_download != nullptr;
+}
+
+// The record follows at once, as the next rescan would make it (a time from [Times] comes
+// back then).
+void SimReceiverFile::ChangeTreeFile(bool grow) {
+    HANDLE file = CreateFileW(m_file->path.c_str(), FILE_APPEND_DATA | FILE_READ_ATTRIBUTES | FILE_WRITE_ATTRIBUTES,
+                              FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr, OPEN_EXISTING, 0, nullptr);
+    FILETIME written = {};
+    DWORD done = 0;
+    if (file == INVALID_HANDLE_VALUE || !GetFileTime(file, nullptr, nullptr, &written)) {
+        SimLog::Write(L"cannot change \"" + m_file->path + L"\"");
+    } else if (grow && WriteFile(file, "+", 1, &done, nullptr) && done == 1) {
+        ++m_file->size;
+        SimLog::Write(L"grown by a byte: \"" + m_file->path + L"\"");
+    } else if (!grow) {
+        ULARGE_INTEGER later = {{written.dwLowDateTime, written.dwHighDateTime}};
+        later.QuadPart += 60ull * 10000000ull;
+        written = {later.LowPart, later.HighPart};
+        if (SetFileTime(file, nullptr, nullptr, &written)) m_file->time += 1.0 / (24 * 60);
+        SimLog::Write(L"a minute newer: \"" + m_file->path + L"\"");
+    }
+    if (file != INVALID_HANDLE_VALUE) CloseHandle(file);
 }
 
 void SimReceiverFile::FireStep(const SimDownload::Event& event) {
@@ -143,6 +169,8 @@ void SimReceiverFile::FireStep(const SimDownload::Event& event) {
         m_point.Fire(3, subject, &second);
         break;
     case SimDownload::Step::Exit:
+    case SimDownload::Step::Grow:
+    case SimDownload::Step::Retime:
         break;
     }
 }

@@ -44,6 +44,7 @@ private:
     HRESULT Fault(const wchar_t* call) const { return m_model->CallFault(call, m_receiver.get(), m_file->name); }
     HRESULT StartDownload(const VARIANT& destination);
     void FireStep(const SimDownload::Event& event);
+    void ChangeTreeFile(bool grow);
 
     std::shared_ptr<SimModel> m_model;
     std::shared_ptr<SimReceiverRecord> m_receiver;

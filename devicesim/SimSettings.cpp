@@ -12,7 +12,8 @@ void LogBadValue(const std::wstring& name, const std::wstring& reason) {
 }
 
 void ReadTransfer(HKEY key, SimFaults* faults) {
-    for (const wchar_t* name : {L"Rate", L"FailAtPercent", L"FailResult", L"ExitAtPercent"}) {
+    for (const wchar_t* name :
+         {L"Rate", L"FailAtPercent", L"FailResult", L"ExitAtPercent", L"GrowAtPercent", L"RetimeAtPercent"}) {
         DWORD value = 0, size = sizeof value;
         if (RegGetValueW(key, nullptr, name, RRF_RT_REG_DWORD, nullptr, &value, &size) != ERROR_SUCCESS) continue;
         std::wstring reason;

@@ -2,7 +2,8 @@
 # fetch_watch_check.sh BUILD_DIR: calvex-fetch --watch against the simulator's live folder
 # events. A receiver plugged in, a file logged on another, a burst of files, a receiver
 # unplugged while a file of it downloads and plugged back with a file logged meanwhile, then a
-# real Ctrl+C during a download. Guards against files fetched twice or not at all, partial or
+# real Ctrl+C during a download; then a watch with --move and a layout empties the receivers,
+# a file logged meanwhile included. Guards against files fetched twice or not at all, partial or
 # mistimed files, lost notifications and a tool that does not end.
 set -u
 build=$1
@@ -77,6 +78,33 @@ cat "$out.2" >>"$out"
 # Every file the receivers hold, once (the two changed while away twice), whole, with its time,
 # and nothing else.
 landed "$out" "Calvex B/LOG0001" "Calvex B/LOG0003"
+
+# --move with a layout: every file is fetched again into its new place and deleted on the
+# receiver, and so is one logged while watching. The copies made above are the reference.
+"$run" "$build/CalvexDeviceSim.exe" /Quit
+sed -i 's/^Rate=.*/Rate=0/' "$root"/*/receiver.ini
+"$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$root")" /f >/dev/null 2>&1
+files=$(find "$root" -type f ! -name receiver.ini | wc -l)
+"$run" "$build/calvex-fetch.exe" --watch --move --layout '{brand}\{receiver}' "$(win "$target")" >"$out.3" 2>"$work/err.txt" &
+tool=$!
+waitfor "$out.3" "  moved       " 60 "$files"
+log "$root/Calvex A" MOVED 5000
+cp -p "$root/Calvex A/MOVED" "$work/MOVED.sent"
+waitfor "$out.3" "  moved       Calvex\\A@USB\\MOVED.qpr  4.9 KB" 30
+kill -INT $tool
+ends $tool 10; status=$?
+"$run" reg delete 'HKCU\Software\Calvex\DeviceSim' /v Root /f >/dev/null 2>&1
+echo "--- with --move:"; tr -d '\r' <"$out.3"
+[ $status -eq 0 ] || bad "exit code $status after a watch with --move"
+grep -q "watch ended: $((files + 1)) fetched, 0 failed, $((files + 1)) deleted, " "$out.3" || bad "no summary with the deleted files"
+left=$(find "$root" -type f ! -name receiver.ini)
+[ -z "$left" ] || bad "left on the receivers: $left"
+cmp -s "$work/MOVED.sent" "$target/Calvex/A@USB/MOVED.qpr" || bad "the file logged while watching is not whole"
+for copy in "$target"/*@USB/*; do
+  case $copy in "$target"/C@USB/*) brand=Brennor ;; *) brand=Calvex ;; esac
+  moved=$target/$brand/${copy#$target/}
+  cmp -s "$copy" "$moved" && [ "$(stat -c %Y "$copy")" = "$(stat -c %Y "$moved")" ] || bad "$moved is not whole"
+done
 rm -rf "$work"
-[ $fail -eq 0 ] && echo "PASS: every file once, whole, with its time"
+[ $fail -eq 0 ] && echo "PASS: every file once, whole, with its time; moved, once proven"
 exit $fail

@@ -1,12 +1,14 @@
-// Guards calvex-fetch end to end through the shell: what it fetches, skips and re-fetches (a file changed on the device included), byte-identical files with the device's times in a zone with daylight saving, what lands for each choice of brand and receiver in a batch and in a watch, its exit codes and messages, and failed downloads that leave no file behind.
+// Guards calvex-fetch end to end through the shell: what it fetches, skips and re-fetches (a file changed on the device included), byte-identical files with the device's times in a zone with daylight saving, what lands for each choice of brand and receiver in a batch and in a watch, its exit codes and messages, failed downloads that leave no file behind, --move deleting exactly the files whose copies are proven, and --layout placing files by the receiver's own date.
 #include <windows.h>
 
 #include <gtest/gtest.h>
 
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "com/Handles.h"
 #include "support/DeviceSim.h"
 #include "support/TestSupport.h"
 
@@ -127,7 +129,7 @@ struct UnregisteredDeviceManager {
 };
 
 TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
-    const std::wstring file = target.Path() + L"\\a-file";
+    const std::wstring file = target.Path() + L"\\a-file", fresh = target.Path() + L"\\fresh";
     ASSERT_TRUE(CloseHandle(CreateFileW(file.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_NEW, 0, nullptr)));
     struct Refusal {
         std::wstring arguments;
@@ -145,6 +147,12 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
         {L"--watch --all " + Quoted(target.Path()), "calvex-fetch: --watch and --all exclude each other\r\n"},
         {L"--dry-run --watch " + Quoted(target.Path()), "calvex-fetch: --watch and --dry-run exclude each other\r\n"},
         {Quoted(target.Path()), "calvex-fetch: no device manager: it cannot be started (0x", true},
+        {L"--layout {receiver}\\{doy2} " + Quoted(fresh), "calvex-fetch: --layout: unknown field {doy2}\r\n"},
+        {L"--move --layout ..\\{receiver} " + Quoted(fresh), "calvex-fetch: --layout: \"..\" would leave the target\r\n"},
+        {L"--layout C:\\Survey " + Quoted(fresh), "calvex-fetch: --layout: drive \"C:\"\r\n"},
+        {L"--watch --layout \\{yyyy} " + Quoted(fresh), "calvex-fetch: --layout: absolute path \"\\{yyyy}\"\r\n"},
+        {L"--layout {yyyy}\\\\{doy} " + Quoted(fresh), "calvex-fetch: --layout: empty folder name in \"{yyyy}\\\\{doy}\"\r\n"},
+        {L"--layout {mm}:{dd} " + Quoted(fresh), "calvex-fetch: --layout: \"{mm}:{dd}\" cannot name a folder ("},
     };
     for (const Refusal& refusal : refusals) {
         SCOPED_TRACE(Narrow(refusal.arguments));
@@ -156,6 +164,7 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
         EXPECT_EQ(0, run.Count(" fetched, ")) << run.out;
     }
     EXPECT_EQ(std::vector<std::wstring>{L"a-file"}, ListFiles(target.Path()));
+    EXPECT_FALSE(FileExists(fresh)) << "a bad layout touches nothing, not even the target";
 }
 
 TEST_F(FetchToolTest, FailedDownloadLeavesNoFileAndExitsOne) {
@@ -174,5 +183,79 @@ TEST_F(FetchToolTest, FailedDownloadLeavesNoFileAndExitsOne) {
     EXPECT_EQ(1, run.Count("1 fetched, 0 skipped, 1 failed, 2.9 KB in ")) << run.out;
     EXPECT_EQ(std::vector<std::wstring>{L"GO@USB\\GOOD.qpr"}, ListFiles(target.Path()))
         << "nothing of the failed file, not even a partial";
+}
+
+// --move deletes a file on the receiver only once its copy is proven and the receiver still
+// reports it unchanged: a differing copy is fetched anew first (and stays when that fails),
+// files that change during their download and refused deletes stay, and a dry run touches nothing.
+TEST_F(FetchToolTest, MoveDeletesExactlyTheFilesWhoseCopiesAreProven) {
+    ReceiverTree tree;
+    const std::pair<const wchar_t*, const wchar_t*> receivers[] = {  // model, transfer fault
+        {L"M1", L""}, {L"MF", L"FailAtPercent=50"}, {L"MG", L"GrowAtPercent=50"}, {L"MR", L""}, {L"MT", L"RetimeAtPercent=50"}};
+    for (const auto& r : receivers)
+        tree.AddReceiver({r.first, 1, L"Test receiver", r.first, r.first, 2, L"", {L"[Transfer]", L"Rate=40000", r.second,
+                          L"[Fail]", wcscmp(r.first, L"MR") ? L"" : L"IReceiverFile.Delete=0x80070005"}});
+    for (const wchar_t* file : {L"M1\\SAME", L"M1\\DIFFERS2", L"MF\\DIFFERS", L"MG\\GROWS", L"MR\\REFUSED", L"MT\\RETIMED"})
+        tree.AddFile(std::wstring(file, 2), file + 3, 30000);
+    DeviceSimScope scope(tree.Root());
+    const std::wstring into = Quoted(target.Path()) + L" ", copies = target.Path() + L"\\";
+    ASSERT_EQ(0u, RunFetch(L"--receiver M1@USB " + into).exitCode);
+    tree.AddFile(L"M1", L"NEW1", 5000);
+    CreateDirectoryW((copies + L"MF@USB").c_str(), nullptr);
+    for (const wchar_t* stale : {L"M1@USB\\DIFFERS2.qpr", L"MF@USB\\DIFFERS.qpr"}) {  // copies that differ
+        UniqueFile file(CreateFileW((copies + stale).c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
+        DWORD written = 0;
+        ASSERT_TRUE(WriteFile(file.Get(), "0123456789", 10, &written, nullptr));
+    }
+    const std::vector<std::wstring> before = ListFiles(tree.Root()), copied = ListFiles(target.Path());
+    std::map<std::wstring, std::string> bytes;
+    for (const std::wstring& file : before) bytes[file] = ReadFileBytes(tree.Root() + L"\\" + file);
+
+    const FetchRun dry = RunFetch(L"--dry-run --move " + into);
+    EXPECT_EQ(0u, dry.exitCode) << dry.out;
+    EXPECT_EQ(7, dry.Count("  would move  ")) << dry.out;
+    EXPECT_EQ(1, dry.Count("  would move  SAME.qpr (already in the target)\r\n")) << dry.out;
+    EXPECT_EQ(1, dry.Count("dry run: 6 to fetch, 1 skipped, 0 failed, 7 to delete, ")) << dry.out;
+    EXPECT_EQ(before, ListFiles(tree.Root()));
+    EXPECT_EQ(copied, ListFiles(target.Path()));
+
+    const FetchRun run = RunFetch(L"--move " + into);
+    EXPECT_EQ(1u, run.exitCode) << run.out;
+    for (const char* line : {"  moved       DIFFERS2.qpr  29.3 KB\r\n", "  moved       NEW1.qpr  4.9 KB\r\n",
+                             "  deleted     SAME.qpr (already in the target)\r\n", "  FAILED      DIFFERS.qpr: download failed",
+                             "  kept        GROWS.qpr  29.3 KB (fetched; still changing on the receiver)\r\n",
+                             "  FAILED      REFUSED.qpr: the receiver refused the delete (0x80070005); the copy stays\r\n",
+                             "  kept        RETIMED.qpr  29.3 KB (fetched; still changing on the receiver)\r\n",
+                             "5 fetched, 1 skipped, 2 failed, 3 deleted, "})
+        EXPECT_EQ(1, run.Count(line)) << line << run.out;
+    const std::vector<std::wstring> left = {L"M1\\receiver.ini", L"MF\\DIFFERS", L"MF\\receiver.ini", L"MG\\GROWS", L"MG\\receiver.ini",
+                                            L"MR\\REFUSED", L"MR\\receiver.ini", L"MT\\RETIMED", L"MT\\receiver.ini"};
+    EXPECT_EQ(left, ListFiles(tree.Root()));
+    for (const wchar_t* file : {L"M1\\SAME", L"M1\\DIFFERS2", L"M1\\NEW1", L"MG\\GROWS", L"MR\\REFUSED", L"MT\\RETIMED"})
+        EXPECT_EQ(bytes[file], ReadFileBytes(copies + std::wstring(file, 2) + L"@USB" + (file + 2) + L".qpr")) << Narrow(file);
+    EXPECT_EQ(10u, ReadFileBytes(copies + L"MF@USB\\DIFFERS.qpr").size()) << "a failed download keeps the old copy";
+}
+
+// Files go where the layout says, by the date the receiver gives them, a year end at 23:58 and
+// the night the zone leaves daylight saving included; --new and --move compare them there.
+TEST_F(FetchToolTest, LayoutPlacesFilesByTheReceiversOwnDate) {
+    ReceiverTree tree;
+    tree.AddReceiver({L"Calvex 1", 1, L"Test receiver", L"1000-0001", L"Q9/X", 2, L"",
+                      {L"[Times]", L"YEAREND=2026-12-31 23:58:00", L"FALLBACK=2026-11-01 01:30:00", L"NEWYEAR=2027-01-01 00:00:05"}});
+    for (const wchar_t* name : {L"YEAREND", L"FALLBACK", L"NEWYEAR"}) tree.AddFile(L"Calvex 1", name, 700);
+    DeviceSimScope scope(tree.Root());
+    const std::wstring into = L" " + Quoted(target.Path());
+    const FetchRun first = RunFetch(L"--layout {receiver}\\{yyyy}\\{doy}" + into);
+    EXPECT_EQ(1, first.Count(" -> " + Narrow(target.Path()) + "\\Q9_X@USB\\{yyyy}\\{doy}\r\n")) << first.out;
+    EXPECT_EQ(1, first.Count("  fetched     Q9_X@USB\\2026\\365\\YEAREND.qpr  700 bytes")) << first.out;
+    const std::vector<std::wstring> filed = {L"Q9_X@USB\\2026\\305\\FALLBACK.qpr", L"Q9_X@USB\\2026\\365\\YEAREND.qpr",
+                                             L"Q9_X@USB\\2027\\001\\NEWYEAR.qpr"};
+    EXPECT_EQ(filed, ListFiles(target.Path()));
+    const FetchRun dated = RunFetch(L"--dry-run --layout {yyyy}-{mm}-{dd}\\{serial}" + into);
+    EXPECT_EQ(1, dated.Count("  would fetch 2026-12-31\\1000-0001\\YEAREND.qpr  ")) << dated.out;
+    const FetchRun moved = RunFetch(L"--move --layout {receiver}/{yyyy}/{doy}" + into);
+    EXPECT_EQ(1, moved.Count("0 fetched, 3 skipped, 0 failed, 3 deleted, ")) << moved.out;
+    EXPECT_EQ(std::vector<std::wstring>{L"Calvex 1\\receiver.ini"}, ListFiles(tree.Root()));
+    EXPECT_EQ(filed, ListFiles(target.Path()));
 }
 }  // namespace

@@ -4,38 +4,66 @@
 
 #include "DescriptorName.h"
 #include "DownloadDialogWatch.h"
-#include "ReceiverList.h"
 #include "ShellNamespace.h"
 #include "VirtualFiles.h"
 #include "com/ComPtr.h"
 
 namespace {
-ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
-    return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+// The file's time as the receiver reports it, its own clock: what the layout's dates come from.
+SYSTEMTIME ReceiverClock(const FILEDESCRIPTORW& descriptor) {
+    SYSTEMTIME clock = {};
+    FileTimeToSystemTime(&descriptor.ftLastWriteTime, &clock);
+    return clock;
+}
+
+// Makes every folder of the relative path below target.
+bool MakeFolders(const std::wstring& target, const std::wstring& relative) {
+    std::wstring path = target;
+    for (size_t at = 0; at <= relative.size();) {
+        const size_t end = relative.find(L'\\', at);
+        path += L"\\" + relative.substr(at, end - at);
+        if (!CreateDirectoryW(path.c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
+        if (end == std::wstring::npos) break;
+        at = end + 1;
+    }
+    return true;
 }
 }  // namespace
 
 bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
-    WIN32_FILE_ATTRIBUTE_DATA found = {};
-    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &found)) return false;
-    if (found.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY) return false;
-    const ULONGLONG size = (static_cast<ULONGLONG>(found.nFileSizeHigh) << 32) | found.nFileSizeLow;
-    const FILETIME time = DescriptorWriteTime(descriptor);
-    return size == DescriptorSize(descriptor) && CompareFileTime(&found.ftLastWriteTime, &time) == 0;
+    const DWORD both = FD_FILESIZE | FD_WRITESTIME;
+    return (descriptor.dwFlags & both) == both && IsOnDiskAsDescribed(path, descriptor);
 }
 
-void ReceiverFetcher::Run(IShellFolder* receiver, const std::wstring& targetDir) {
+void ReceiverFetcher::Run(IShellFolder* files, const Receiver& receiver, const std::wstring& target) {
+    m_receiver = &receiver;
+    m_target = target;
+    m_receiverShown = m_watching ? m_layout.Shown(receiver.Fields()) + L"\\" : L"";
     HRESULT hr = S_OK;
-    std::vector<OwnedItem> files = ShellChildren(receiver, SHCONTF_NONFOLDERS, &hr);
+    std::vector<OwnedItem> items = ShellChildren(files, SHCONTF_NONFOLDERS, &hr);
     if (FAILED(hr)) Fail(L"(file list)", L"the receiver's files cannot be listed (" + HexText(hr) + L")");
     const int failedBefore = m_totals.failed;
-    for (const OwnedItem& file : files) {
+    for (size_t i = 0; i < items.size(); ++i) {
         if (m_interrupted || (m_givenUp && m_totals.failed > failedBefore)) return;
-        FetchItem(receiver, file.get(), targetDir);
+        if (m_tell) m_tell(static_cast<int>(items.size() - i));
+        FetchItem(files, items[i].get());
     }
 }
 
-void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item, const std::wstring& targetDir) {
+bool ReceiverFetcher::Place(const FILEDESCRIPTORW& descriptor, std::wstring& targetDir) {
+    const SafeName folder = m_layout.Folder(m_receiver->Fields(), ReceiverClock(descriptor), m_target.size());
+    if (folder.refused) {
+        Fail(descriptor.cFileName, L"no folder name: " + folder.reason);
+        return false;
+    }
+    targetDir = m_target + L"\\" + folder.name;
+    // A batch names the receiver's folder in its line, unless the file's own date picks it.
+    m_shownFolder = m_watching || m_layout.IsDated() ? folder.name + L"\\" : L"";
+    return true;
+}
+
+void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item) {
+    m_shownFolder = m_receiverShown;
     const std::wstring listed = ShellName(receiver, item, SHGDN_INFOLDER);
     ComPtr<IDataObject> data;
     HRESULT hr = receiver->GetUIObjectOf(nullptr, 1, &item, IID_IDataObject, nullptr, data.PutVoid());
@@ -46,34 +74,47 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item, co
     }
     const FILEDESCRIPTORW& descriptor = descriptors[0];
     const std::wstring name = descriptor.cFileName;
-    if (m_givenUp && m_givenUp->count(name)) return;
+    std::wstring targetDir;
+    if ((m_givenUp && m_givenUp->count(name)) || !Place(descriptor, targetDir)) return;
     const SafeName safe = MakeSafeDescriptorName(name, targetDir.size());
     if (safe.refused) return Fail(name, L"refused name: " + safe.reason);
     const std::wstring shown = m_shownFolder + (safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")");
-    if (!m_options.all && IsAlreadyFetched(targetDir + L"\\" + safe.name, descriptor)) {
+    const std::wstring path = targetDir + L"\\" + safe.name;
+    if (!m_options.all && IsAlreadyFetched(path, descriptor)) {
         ++m_totals.skipped;
+        if (m_options.move) return Remove(descriptor, shown, false);
         // A watch compares again at every event: only news is worth a line there.
-        return m_options.watch ? void() : m_console.Line(L"  up to date  " + shown);
+        return m_watching ? void() : m_console.Line(L"  up to date  " + shown);
     }
-    if (m_options.dryRun) {
-        ++m_totals.fetched;
-        m_totals.bytes += DescriptorSize(descriptor);
-        return m_console.Line(L"  would fetch " + shown + L"  " + ByteText(DescriptorSize(descriptor)));
-    }
+    if (!m_options.dryRun) return Fetch(data.Get(), descriptor, targetDir, path, shown);
+    ++m_totals.fetched;
+    m_totals.deleted += m_options.move ? 1 : 0;
+    m_totals.bytes += DescriptorSize(descriptor);
+    m_console.Line((m_options.move ? L"  would move  " : L"  would fetch ") + shown + L"  " +
+                   ByteText(DescriptorSize(descriptor)));
+}
+
+void ReceiverFetcher::Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& targetDir,
+                            const std::wstring& path, const std::wstring& shown) {
+    const std::wstring name = descriptor.cFileName;
     std::wstring error;
-    if (!Download(data.Get(), descriptor, name, targetDir, error)) {
+    if (!Download(data, descriptor, name, targetDir, error)) {
         // Stopped by the user: nothing failed, the file simply was not kept.
         if (m_interrupted) return m_console.Line(L"  discarded   " + m_shownFolder + name + L" (stopped)");
         return Fail(name, error);
     }
     ++m_totals.fetched;
     m_totals.bytes += DescriptorSize(descriptor);
-    m_console.Line(L"  fetched     " + shown + L"  " + ByteText(DescriptorSize(descriptor)));
+    const std::wstring line = shown + L"  " + ByteText(DescriptorSize(descriptor));
+    if (!m_options.move) return m_console.Line(L"  fetched     " + line);
+    if (IsAlreadyFetched(path, descriptor)) return Remove(descriptor, shown, true);
+    ++m_totals.kept;  // whole, but the disk cannot hold the receiver's time: no proof for a delete
+    m_console.Line(L"  kept        " + line + L" (fetched; its time cannot be kept on this disk)");
 }
 
 bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& shownName,
                                const std::wstring& targetDir, std::wstring& error) {
-    if (!CreateDirectoryW(targetDir.c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) {
+    if (!MakeFolders(m_target, targetDir.substr(m_target.size() + 1))) {
         error = L"cannot create " + targetDir;
         return false;
     }
@@ -92,11 +133,38 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
         error = hr == S_FALSE ? L"download failed or cancelled" : L"no contents (" + HexText(hr) + L")";
         return false;
     }
+    // S_OK: flushed, renamed with write-through, and read back in place (VirtualFiles.h).
     return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));
+}
+
+// Only a file whose copy is proven whole gets here: fetched now (WriteVirtualFile's S_OK) or
+// already in the target with the receiver's size and time.
+void ReceiverFetcher::Remove(const FILEDESCRIPTORW& descriptor, const std::wstring& shown, bool fetchedNow) {
+    const std::wstring size = fetchedNow ? L"  " + ByteText(DescriptorSize(descriptor)) : L"";
+    const std::wstring already = fetchedNow ? L"" : L" (already in the target)";
+    if (m_options.dryRun) {
+        ++m_totals.deleted;
+        return m_console.Line(L"  would move  " + shown + already);
+    }
+    if (!m_deleter) m_deleter.reset(new ReceiverFileDeleter(*m_receiver));
+    HRESULT why = S_OK;
+    switch (m_deleter->Delete(descriptor, why)) {
+    case ReceiverFileDeleter::Outcome::Deleted:
+        ++m_totals.deleted;
+        return m_console.Line((fetchedNow ? L"  moved       " : L"  deleted     ") + shown + size + already);
+    case ReceiverFileDeleter::Outcome::Changed:
+        ++m_totals.kept;
+        return m_console.Line(L"  kept        " + shown + size + (fetchedNow ? L" (fetched; " : L" (already in the target; ") +
+                              L"still changing on the receiver)");
+    case ReceiverFileDeleter::Outcome::Refused:
+        ++m_totals.kept;
+        return Fail(descriptor.cFileName, L"the receiver refused the delete (" + HexText(why) + L"); the copy stays");
+    }
 }
 
 void ReceiverFetcher::Fail(const std::wstring& name, const std::wstring& reason) {
     ++m_totals.failed;
+    if (m_totals.firstFailure.empty()) m_totals.firstFailure = name + L": " + reason;
     if (m_givenUp) m_givenUp->insert(name);
     m_console.Line(L"  FAILED      " + m_shownFolder + name + L": " + reason);
 }

@@ -10,6 +10,14 @@ constexpr DISPID kReceiversProperty = 1;
 
 const wchar_t* const kBrandNames[2] = {L"Calvex", L"Brennor"};
 
+LayoutReceiver Receiver::Fields() const {
+    const size_t first = key.find(L'!'), last = key.rfind(L'!');
+    LayoutReceiver fields{display, key.substr(0, first), L"", brand};
+    if (first != std::wstring::npos && last > first) fields.model = key.substr(first + 1, last - first - 1);
+    for (wchar_t& c : fields.model) if (c == L'#') c = L'/';
+    return fields;
+}
+
 std::vector<Receiver> BrandReceivers(IShellFolder* brandFolder, int brand, HRESULT* result) {
     std::vector<Receiver> receivers;
     for (OwnedItem& item : ShellChildren(brandFolder, SHCONTF_FOLDERS, result)) {

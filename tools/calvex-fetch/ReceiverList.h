@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "FetchOptions.h"
+#include "LayoutPattern.h"
 #include "ShellNamespace.h"
 #include "com/ComPtr.h"
 #include "com/ServerGone.h"
@@ -22,6 +23,8 @@ struct Receiver {
     OwnedItem item;
     // "Calvex Q7/RTK@COM3 (5211-40125!Q7#RTK!COM3)"
     std::wstring Title() const { return brand + L" " + display + L" (" + key + L")"; }
+    // Display name, brand, and serial and model as the key holds them ("Q7#RTK" is "Q7/RTK").
+    LayoutReceiver Fields() const;
 };
 
 // The receivers of one brand folder (0 Calvex, 1 Brennor), in listing order.

@@ -30,7 +30,10 @@ std::wstring Duration(ULONGLONG milliseconds) {
 ReceiverWatch::ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
                              const std::atomic<bool>& interrupted, HANDLE stop)
     : m_options(options), m_target(target), m_console(console), m_interrupted(interrupted), m_stop(stop),
-      m_listener([this](LONG, PCIDLIST_ABSOLUTE item) { OnChange(item); }) {}
+      m_listener([this](LONG, PCIDLIST_ABSOLUTE item) { OnChange(item); }) {
+    std::wstring error;
+    m_layout.Parse(options.layout, error);
+}
 
 int ReceiverWatch::Run() {
     if (!Start()) return 2;
@@ -38,6 +41,7 @@ int ReceiverWatch::Run() {
     ULONGLONG nextProbe = m_started + kLivenessMs, nextRescan = m_started + kRescanMs;
     while (!m_interrupted) {
         if (m_gone) {
+            TellIdle();
             Reconnect();
             nextRescan = GetTickCount64() + kRescanMs;
             continue;
@@ -59,6 +63,7 @@ int ReceiverWatch::Run() {
             }
             nextRescan = now + kRescanMs;
         }
+        if (!AnyDirty() && !m_gone) TellIdle();
         if (!AnyDirty() && !m_gone) WaitForWork(static_cast<DWORD>((nextProbe < nextRescan ? nextProbe : nextRescan) - now));
     }
     m_console.Line(Summary());
@@ -208,7 +213,7 @@ void ReceiverWatch::ScanBrand(int brand) {
 
 void ReceiverWatch::Add(Receiver receiver, int brand) {
     const std::wstring title = receiver.Title() + (m_plugging ? L" plugged in" : L"");
-    const SafeName folder = MakeSafeFolderName(receiver.display, m_target.size());
+    const SafeName folder = m_layout.Check(receiver.Fields(), m_target.size());
     Watched watched;
     if (folder.refused) {
         ++m_totals.failed;
@@ -220,8 +225,8 @@ void ReceiverWatch::Add(Receiver receiver, int brand) {
         m_console.Line(title + L": FAILED, the receiver cannot be opened");
         watched.dirty = false;
     } else {
-        watched.folder = folder.name;
-        m_console.Line(title + L" -> " + m_target + L"\\" + folder.name);
+        watched.folder = m_layout.Shown(receiver.Fields());
+        m_console.Line(title + L" -> " + m_target + L"\\" + watched.folder);
     }
     const std::wstring id = WatchId(brand, receiver.key);
     watched.receiver = std::move(receiver);
@@ -239,30 +244,61 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     Reopen(watched);
     FetchTotals pass;
     const std::set<std::wstring> givenUpBefore = watched.givenUp;
-    ReceiverFetcher fetcher(m_options, m_console, pass, m_interrupted);
-    fetcher.Watching(watched.folder, &watched.givenUp);
-    fetcher.Run(watched.files.Get(), m_target + L"\\" + watched.folder);
+    ReceiverFetcher fetcher(m_options, m_layout, m_console, pass, m_interrupted);
+    fetcher.Watching(&watched.givenUp);
+    m_idle = false;
+    if (m_observer) {
+        WatchObserver* observer = m_observer;
+        const std::wstring display = watched.receiver.display;
+        fetcher.OnEachFile([observer, display](int left) { observer->Working(display, left); });
+    }
+    fetcher.Run(watched.files.Get(), watched.receiver, m_target);
     if (pass.fetched) watched.retried = false;
     if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
         // Cut by the unplug or by the device manager going away: what is missing is fetched
         // when the receiver is back (all receivers are dropped while the device manager is away).
+        pass.failed = 0;
         if (!m_gone) {
             m_console.Line(watched.receiver.Title() + L" unplugged; what it had not sent comes when it is back");
+            EndPass(watched, pass, true);
             m_watched.erase(found);
         }
-        pass.failed = 0;
     } else if (pass.failed && !watched.retried) {
         // Perhaps unplugged and plugged back during the pass: once more before giving files up.
         m_console.Line(watched.receiver.Title() + L": trying once more");
         watched.givenUp = givenUpBefore;
         watched.retried = watched.dirty = true;
         pass.failed = 0;
-    } else if (pass.failed) {
-        watched.dirty = true;  // the run stopped at the failure: on with the other files
+    } else {
+        // After a failure the run stopped there: on with the other files.
+        watched.dirty = watched.dirty || pass.failed;
+        EndPass(watched, pass, false);
     }
     m_totals.fetched += pass.fetched;
     m_totals.failed += pass.failed;
+    m_totals.deleted += pass.deleted;
     m_totals.bytes += pass.bytes;
+}
+
+void ReceiverWatch::EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged) {
+    if (!m_observer) return;
+    ReceiverPass ended;
+    ended.receiver = watched.receiver.display;
+    ended.target = m_target;
+    ended.files = pass.fetched + pass.skipped;
+    ended.fetched = pass.fetched;
+    ended.failed = pass.failed;
+    ended.deleted = pass.deleted;
+    ended.kept = pass.kept;
+    ended.firstFailure = pass.firstFailure;
+    ended.unplugged = unplugged;
+    m_observer->PassEnded(ended);
+}
+
+void ReceiverWatch::TellIdle() {
+    if (m_idle) return;
+    m_idle = true;
+    if (m_observer) m_observer->Idle();
 }
 
 // A receiver unplugged and plugged back between two looks is a new object of the device
@@ -302,6 +338,6 @@ void ReceiverWatch::WaitForWork(DWORD milliseconds) {
 
 std::wstring ReceiverWatch::Summary() const {
     return L"watch ended: " + std::to_wstring(m_totals.fetched) + L" fetched, " + std::to_wstring(m_totals.failed) +
-           L" failed, " + ByteText(m_totals.bytes) + L" in " + Duration(GetTickCount64() - m_started) +
+           L" failed, " + (m_options.move ? std::to_wstring(m_totals.deleted) + L" deleted, " : L"") + ByteText(m_totals.bytes) + L" in " + Duration(GetTickCount64() - m_started) +
            (m_interrupted ? L" (stopped)" : L"");
 }

@@ -14,15 +14,21 @@
 
 #include "FetchConsole.h"
 #include "FetchOptions.h"
+#include "LayoutPattern.h"
 #include "ReceiverFetcher.h"
 #include "ReceiverList.h"
+#include "ReceiverPass.h"
 #include "ShellChangeListener.h"
 
 class ReceiverWatch {
 public:
-    // interrupted and stop are set by the console's Ctrl+C handler.
+    // interrupted and stop are set by the console's Ctrl+C handler. options.layout has been
+    // parsed once already (bad patterns are refused before a watch starts).
     ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
                   const std::atomic<bool>& interrupted, HANDLE stop);
+
+    // Who hears where the watch stands, on this thread; null: nobody.
+    void SetObserver(WatchObserver* observer) { m_observer = observer; }
 
     // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start
     // (the reason on stderr). A device manager that is not there yet, or goes away, is waited for.
@@ -32,7 +38,7 @@ private:
     struct Watched {
         Receiver receiver;
         ComPtr<IShellFolder> files;  // bound: the folder then follows the receiver's file events
-        std::wstring folder;  // below the target
+        std::wstring folder;  // below the target, as the layout shows it; empty: left alone
         bool dirty = true;
         std::set<std::wstring> givenUp;  // failed while plugged in this time
         bool retried = false;  // tried again after a failure, and nothing fetched since
@@ -52,6 +58,8 @@ private:
     void Reopen(Watched& watched);
     bool DeviceManagerGone();
     void WaitForWork(DWORD milliseconds);
+    void TellIdle();
+    void EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged);
     std::wstring Summary() const;
 
     const FetchOptions& m_options;
@@ -68,5 +76,8 @@ private:
     bool m_gone = false;
     std::map<std::wstring, Watched> m_watched;  // by brand and key
     FetchTotals m_totals;
+    LayoutPattern m_layout;
+    WatchObserver* m_observer = nullptr;
+    bool m_idle = false;  // Idle told, and no work since
     ULONGLONG m_started = 0;
 };

@@ -21,6 +21,7 @@
 #include "DownloadDialogWatch.h"
 #include "FetchConsole.h"
 #include "FetchOptions.h"
+#include "LayoutPattern.h"
 #include "MessageBoxAnswerer.h"
 #include "OffScreenDialogs.h"
 #include "ReceiverFetcher.h"
@@ -110,22 +111,22 @@ std::wstring WhyNoReceivers() {
     return FAILED(hr) ? NoDeviceManagerText(hr) : std::wstring(kNoReceiver);
 }
 
-void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options, FetchConsole& console,
-                   FetchTotals& totals) {
-    const SafeName folder = MakeSafeFolderName(receiver.display, target.size());
+void FetchReceiver(Receiver& receiver, const std::wstring& target, const FetchOptions& options,
+                   const LayoutPattern& layout, FetchConsole& console, FetchTotals& totals) {
+    const SafeName folder = layout.Check(receiver.Fields(), target.size());
     const std::wstring header = receiver.Title();
     if (folder.refused) {
         ++totals.failed;
         return console.Line(header + L": FAILED, no folder name: " + folder.reason);
     }
-    console.Line(header + L" -> " + target + L"\\" + folder.name);
+    console.Line(header + L" -> " + target + L"\\" + layout.Shown(receiver.Fields()));
     ComPtr<IShellFolder> files;
     HRESULT hr = receiver.parent->BindToObject(receiver.item.get(), nullptr, IID_IShellFolder, files.PutVoid());
     if (FAILED(hr)) {
         ++totals.failed;
         return console.Line(L"  FAILED      the receiver cannot be opened");
     }
-    ReceiverFetcher(options, console, totals, g_interrupted).Run(files.Get(), target + L"\\" + folder.name);
+    ReceiverFetcher(options, layout, console, totals, g_interrupted).Run(files.Get(), receiver, target);
 }
 
 std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULONGLONG milliseconds) {
@@ -133,18 +134,11 @@ std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULO
     swprintf(seconds, 32, L"%.1f s", milliseconds / 1000.0);
     return std::wstring(options.dryRun ? L"dry run: " : L"") + std::to_wstring(totals.fetched) +
            (options.dryRun ? L" to fetch, " : L" fetched, ") + std::to_wstring(totals.skipped) + L" skipped, " +
-           std::to_wstring(totals.failed) + L" failed, " + ByteText(totals.bytes) + L" in " + seconds +
+           std::to_wstring(totals.failed) + L" failed, " +
+           (options.move ? std::to_wstring(totals.deleted) + (options.dryRun ? L" to delete, " : L" deleted, ") : L"") +
+           ByteText(totals.bytes) + L" in " + seconds +
            (g_interrupted ? L" (interrupted)" : L"");
 }
-
-// The watch tells the observer where it stands and how each receiver's pass ended. Until the
-// watch takes an observer (ReceiverWatch::SetObserver), it is told nothing.
-template <typename Watch>
-auto AttachObserver(Watch& watch, WatchObserver* observer, int) -> decltype(watch.SetObserver(observer), void()) {
-    watch.SetObserver(observer);
-}
-template <typename Watch>
-void AttachObserver(Watch&, WatchObserver*, long) {}
 
 // The windowless watch has an icon in the notification area unless told not to (--no-notify);
 // the console build has its console. Either way the notices are lines of the console and log.
@@ -155,11 +149,11 @@ int Watch(const FetchOptions& options, const std::wstring& target, FetchConsole&
 #endif
     TrayNotifier notifier(console, target, icon.get());
     ReceiverWatch watch(options, target, console, g_interrupted, g_stop);
-    AttachObserver(watch, &notifier, 0);
+    watch.SetObserver(&notifier);
     return watch.Run();
 }
 
-int Fetch(const FetchOptions& options, FetchConsole& console) {
+int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchConsole& console) {
     const std::wstring target = FullPath(options.target);
 #ifdef CALVEX_WINDOWLESS
     console.SetLog(options.log.empty() ? target + L"\\calvex-fetch.log" : FullPath(options.log));
@@ -205,7 +199,7 @@ int Fetch(const FetchOptions& options, FetchConsole& console) {
     FetchTotals totals;
     for (Receiver& receiver : receivers) {
         if (g_interrupted) break;
-        FetchReceiver(receiver, target, options, console, totals);
+        FetchReceiver(receiver, target, options, layout, console, totals);
     }
     console.Line(Summary(options, totals, GetTickCount64() - started));
     return totals.failed || g_interrupted ? 1 : 0;
@@ -220,6 +214,12 @@ int wmain(int argc, wchar_t** argv) {
         LogWhereTheUserLooks(console);
         console.Error(error);
         console.Line(kFetchUsage);
+        return 2;
+    }
+    LayoutPattern layout;  // refused before anything is touched, the target's log included
+    if (!layout.Parse(options.layout, error)) {
+        LogWhereTheUserLooks(console);
+        console.Error(L"--layout: " + error);
         return 2;
     }
     if (FAILED(OleInitialize(nullptr))) return 2;
@@ -237,7 +237,7 @@ int wmain(int argc, wchar_t** argv) {
             for (wchar_t& c : flat) if (c == L'\r' || c == L'\n') c = L' ';
             console.Line(L"  message box: " + title + L": " + flat);
         });
-        result = Fetch(options, console);
+        result = Fetch(options, layout, console);
         SetEvent(g_finished);
     }
     OleUninitialize();

@@ -54,8 +54,24 @@ HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written) {
     }
 }
 
+// A file's size and last-write time as the disk holds them.
+struct OnDisk {
+    ULONGLONG size = 0;
+    FILETIME time = {};
+};
+
+bool ReadOnDisk(const std::wstring& path, OnDisk& found) {
+    WIN32_FILE_ATTRIBUTE_DATA data = {};
+    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &data)) return false;
+    found.size = (static_cast<ULONGLONG>(data.nFileSizeHigh) << 32) | data.nFileSizeLow;
+    found.time = data.ftLastWriteTime;
+    return !(data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY);
+}
+
+// flushed: what the file holds once on the disk (a time the disk cannot hold, as 1601 on
+// Wine's, is not the descriptor's).
 HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descriptor, IStream* stream,
-                       std::wstring& error) {
+                       std::wstring& error, OnDisk& flushed) {
     HANDLE file = CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
     if (file == INVALID_HANDLE_VALUE) {
         error = ErrorText(L"cannot create the temporary file", GetLastError());
@@ -63,7 +79,7 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     }
     ULONGLONG written = 0;
     HRESULT hr = CopyStream(stream, file, written);
-    const ULONGLONG expected = (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+    const ULONGLONG expected = DescriptorSize(descriptor);
     const FILETIME time = DescriptorWriteTime(descriptor);
     if (FAILED(hr)) {
         error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
@@ -73,7 +89,12 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
     } else if ((descriptor.dwFlags & FD_WRITESTIME) && !SetFileTime(file, nullptr, nullptr, &time)) {
         error = ErrorText(L"cannot set the write time", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
+    } else if (!FlushFileBuffers(file) || !GetFileTime(file, nullptr, nullptr, &flushed.time)) {
+        // On the disk before it gets its final name: a power cut leaves no short file there.
+        error = ErrorText(L"cannot flush the file to the disk", GetLastError());
+        hr = HRESULT_FROM_WIN32(GetLastError());
     }
+    flushed.size = written;
     CloseHandle(file);
     return hr;
 }
@@ -98,6 +119,18 @@ FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor) {
     if (FileTimeToSystemTime(&descriptor.ftLastWriteTime, &local) && TzSpecificLocalTimeToSystemTime(nullptr, &local, &universal))
         SystemTimeToFileTime(&universal, &moment);
     return moment;
+}
+
+ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
+    return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
+}
+
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
+    OnDisk found;
+    if (!ReadOnDisk(path, found)) return false;
+    const FILETIME time = DescriptorWriteTime(descriptor);
+    if ((descriptor.dwFlags & FD_FILESIZE) && found.size != DescriptorSize(descriptor)) return false;
+    return !(descriptor.dwFlags & FD_WRITESTIME) || CompareFileTime(&found.time, &time) == 0;
 }
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
@@ -153,12 +186,20 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
         return HRESULT_FROM_WIN32(GetLastError());
     }
     const std::wstring temporary = path + kPartialSuffix;
-    HRESULT hr = WriteTemporary(temporary, descriptor, stream, error);
-    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING)) {
+    OnDisk flushed, placed;
+    HRESULT hr = WriteTemporary(temporary, descriptor, stream, error, flushed);
+    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
-    if (FAILED(hr)) DeleteFileW(temporary.c_str());
+    if (FAILED(hr)) {
+        DeleteFileW(temporary.c_str());
+    } else if (!ReadOnDisk(path, placed) || placed.size != flushed.size || CompareFileTime(&placed.time, &flushed.time)) {
+        // Read back under its final name: what is not the file flushed does not stay there.
+        DeleteFileW(path.c_str());
+        error = L"the file on the disk is not the one written after the rename";
+        hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
+    }
     return hr;
 }
 

@@ -20,10 +20,19 @@ HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream);
 // included), so that the file shows the time the receiver logged it.
 FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor);
 
+// The descriptor's size (both halves).
+ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor);
+// True when path is a file of the size and last-write time that the descriptor gives (what it
+// does not give is not compared).
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor);
+
 // Writes the stream's remaining bytes as target\name, the name made safe or refused by
-// MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the
-// size is checked against the descriptor and the write time set, then it is renamed. Nothing
-// is left behind on failure; error says why.
+// MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the size is
+// checked against the descriptor, the write time set and the file flushed to the disk; it is
+// renamed with write-through and read back under its final name: S_OK means that the file
+// flushed is the one in place, whole. With IsOnDiskAsDescribed that proves a copy (a time
+// that the disk cannot hold is not the descriptor's). Nothing is left behind on failure;
+// error says why.
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
                          std::wstring& error);
 

@@ -1,0 +1,2 @@
+# calvex-fetch's --layout patterns, without the shell.
+set(TEST_LIBS calvex_fetch_core)
