@@ -1,9 +1,9 @@
 // Guards the folder's entry points against identifiers from outside: lists of the right
 // overall shape but wrong inside (counts below the fixed fields, names without terminator,
-// counts wrapped by long names, kinds that do not belong, lists that go on too deep or too
-// long) and random bytes, each placed against a no-access page so that a read of one byte
-// past it faults at once. Seeded: a failure or a fault prints the case's own seed, which
-// CALVEX_FUZZ_SEED=<seed> CALVEX_FUZZ_CASES=1 runs again alone.
+// counts wrapped by long names, kinds that do not belong, lists too deep or too long) and
+// random bytes, each against a no-access page so that a read of one byte past it faults at
+// once. A failure or a fault prints the case's seed: CALVEX_FUZZ_SEED=<seed>
+// CALVEX_FUZZ_CASES=1 runs that case alone.
 #include <shlobj.h>
 #include <shlwapi.h>
 
@@ -12,7 +12,6 @@
 #include <cstdio>
 #include <cstdlib>
 #include <random>
-#include <sstream>
 #include <string>
 #include <vector>
 
@@ -27,7 +26,6 @@ using rawpidl::RawItem;
 
 std::string g_case;  // the case running now, printed if it faults
 LPTOP_LEVEL_EXCEPTION_FILTER g_previousFilter = nullptr;
-
 LONG WINAPI ReportCase(EXCEPTION_POINTERS* info) {
     fprintf(stderr, "fault while running %s\n", g_case.c_str());
     fflush(stderr);
@@ -40,83 +38,66 @@ unsigned EnvNumber(const char* name, unsigned fallback) {
 }
 
 enum Shape { Whole, ShortCount, Unterminated, Wrapped, WrongKind, Deep, Long, RandomBytes, ShapeCount };
-const char* const kShapes[] = {"whole",      "short count", "unterminated name", "wrapped count",
-                               "wrong kind", "deep",        "long",              "random bytes"};
-enum Entry { Attributes, Compare, DisplayName, UIObject, Bind, Initialize, EntryCount };
-const char* const kEntries[] = {"GetAttributesOf", "CompareIDs", "GetDisplayNameOf", "GetUIObjectOf", "BindToObject", "Initialize"};
+const char* const kShapes[] = {"whole", "short count", "unterminated name", "wrapped count", "wrong kind", "deep", "long", "random bytes"};
+enum Entry { Attributes, Compare, DisplayName, UIObject, Bind, EntryCount };
+const char* const kEntries[] = {"GetAttributesOf", "CompareIDs", "GetDisplayNameOf", "GetUIObjectOf", "BindToObject"};
 
-// One case: a folder, a list of a shape, an entry point; all drawn from the case's seed.
-class FuzzCase {
+// The lists of one case, drawn from its seed, for a folder of receivers or of files.
+class ListMaker {
 public:
-    FuzzCase(unsigned seed, bool filesLevel) : m_random(seed), m_filesLevel(filesLevel) {}
+    ListMaker(std::mt19937& random, bool filesLevel) : m_random(random), m_filesLevel(filesLevel) {}
     int Int(int low, int high) { return std::uniform_int_distribution<int>(low, high)(m_random); }
     std::vector<RawItem> Items(Shape shape);
 
 private:
-    std::wstring Name(size_t length);
+    std::wstring Name(size_t length) {
+        static const wchar_t alphabet[] = L"!#@/\\.-_ aZ09\x00e9\x4e2d\xd83d\xde00";
+        std::wstring name(length, L'x');
+        for (wchar_t& unit : name) unit = alphabet[Int(0, static_cast<int>(wcslen(alphabet)) - 1)];
+        return name;
+    }
     RawItem Item(DWORD type) { return rawpidl::Whole(type, Name(Int(0, 40)), Int(0, 1 << 20), Int(0, 50000) + Int(0, 999) / 1000.0); }
-    std::vector<RawItem> Held();
-    DWORD WrongKindAt(size_t index);
-    std::mt19937 m_random;
+    // What the folder holds: a file at the files level; a receiver, or one and a file below it.
+    std::vector<RawItem> Held() {
+        if (m_filesLevel) return {Item(ItemTypeFile)};
+        std::vector<RawItem> items = {Item(static_cast<DWORD>(Int(3, 4)))};
+        if (Int(0, 1)) items.push_back(Item(ItemTypeFile));
+        return items;
+    }
+    std::mt19937& m_random;
     bool m_filesLevel;
 };
 
-std::wstring FuzzCase::Name(size_t length) {
-    static const wchar_t alphabet[] = L"!#@/\\.-_ aZ09\x00e9\x4e2d\xd83d\xde00";
-    std::wstring name(length, L'x');
-    for (wchar_t& unit : name) unit = alphabet[Int(0, static_cast<int>(wcslen(alphabet)) - 1)];
-    return name;
-}
-
-// What the folder holds: a file at the files level; a receiver, or one and a file below it.
-std::vector<RawItem> FuzzCase::Held() {
-    if (m_filesLevel) return {Item(ItemTypeFile)};
-    std::vector<RawItem> items = {Item(static_cast<DWORD>(Int(3, 4)))};
-    if (Int(0, 1)) items.push_back(Item(ItemTypeFile));
-    return items;
-}
-
-DWORD FuzzCase::WrongKindAt(size_t index) {
-    const bool fileSlot = m_filesLevel || index > 0;
-    const DWORD never[] = {0, 1, 2, 5, 7, 0xFFFFFFFF, fileSlot ? 3u : 6u, fileSlot ? 4u : 6u};
-    return never[Int(0, 7)];
-}
-
-std::vector<RawItem> FuzzCase::Items(Shape shape) {
+std::vector<RawItem> ListMaker::Items(Shape shape) {
     std::vector<RawItem> items = Held();
     RawItem& last = items.back();
-    switch (shape) {
-    case ShortCount: last.cb = static_cast<USHORT>(Int(1, 19)); break;
-    case Unterminated:  // no zero unit anywhere inside the count
+    if (shape == ShortCount) last.cb = static_cast<USHORT>(Int(1, 19));
+    if (shape == Unterminated) {  // no zero unit anywhere inside the count
         last.terminated = false;
         last.cb = static_cast<USHORT>(Int(20, static_cast<int>(18 + (last.name.size() + 1) * 2 + 9)));
-        break;
-    case Wrapped:  // built as if the count were not checked: (n + 1) * 2 + 27 past 65535
+    }
+    if (shape == Wrapped) {  // built as if the count were not checked: (n + 1) * 2 + 27 past 65535
         last.name = Name(Int(32754, 32780));
         last.cb = static_cast<USHORT>((last.name.size() + 1) * 2 + 27);
-        break;
-    case WrongKind: {
-        const size_t index = Int(0, static_cast<int>(items.size()) - 1);
-        items[index].type = WrongKindAt(index);
-        break;
     }
-    case Deep:
-    case Long:
+    if (shape == WrongKind) {
+        const size_t index = Int(0, static_cast<int>(items.size()) - 1);
+        const bool fileSlot = m_filesLevel || index > 0;
+        const DWORD never[] = {0, 1, 2, 5, 7, 0xFFFFFFFF, fileSlot ? 3u : 6u, fileSlot ? 4u : 6u};
+        items[index].type = never[Int(0, 7)];
+    }
+    if (shape == Deep || shape == Long) {  // items go on past the file
         if (!m_filesLevel && items.size() == 1) items.push_back(Item(ItemTypeFile));
-        for (int extra = shape == Deep ? Int(1, 40) : Int(200, 2000); extra > 0; --extra)
-            items.push_back(Item(static_cast<DWORD>(Int(3, 6))));
-        break;
-    case RandomBytes:
+        for (int extra = shape == Deep ? Int(1, 40) : Int(200, 2000); extra > 0; --extra) items.push_back(Item(Int(3, 6)));
+    }
+    if (shape == RandomBytes) {
         items.clear();
         for (int count = Int(1, 4); count > 0; --count) {
             RawItem item{static_cast<USHORT>(Int(count == 1 ? 1 : 2, 80)), static_cast<DWORD>(Int(0, 8)), Name(Int(0, 30))};
             item.terminated = Int(0, 1);
             for (wchar_t& unit : item.name) unit = Int(0, 9) ? unit : L'\0';
             items.push_back(item);
-            if (item.cb < 2) break;
         }
-        break;
-    default: break;
     }
     return items;
 }
@@ -129,8 +110,7 @@ protected:
     }
     static void TearDownTestSuite() { SetUnhandledExceptionFilter(g_previousFilter); }
 
-    // A root as Explorer makes it, or a receiver folder below one as BindToObject makes it
-    // (without a device manager behind it).
+    // A root as Explorer makes it, or a receiver folder below one as BindToObject makes it.
     template <class T>
     ComPtr<ComObject<T>> MakeFolder(IReceiversShellFolderImpl* parent = nullptr, LPCITEMIDLIST pidl = nullptr) {
         ComPtr<ComObject<T>> folder;
@@ -139,8 +119,8 @@ protected:
         return folder;
     }
     void Run(unsigned seed);
-    void Call(FuzzCase& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list, bool filesLevel, int held);
-    void Expect(bool ok, const std::string& what) {
+    void Call(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list, LPCITEMIDLIST whole, int held);
+    void Expect(bool ok, const char* what) {
         if (!ok && ++failures <= 20) ADD_FAILURE() << what << " in " << g_case;
     }
 
@@ -148,81 +128,56 @@ protected:
     ComPtr<ComObject<CCalvexReceiversShellFolder>> calvex = MakeFolder<CCalvexReceiversShellFolder>();
     ComPtr<ComObject<CBrennorReceiversShellFolder>> brennor = MakeFolder<CBrennorReceiversShellFolder>();
     UniquePidl receiverItem{mgr, mgr.Create(ItemTypeCalvexReceiver, L"123!Z#5!COM3")};
-    ComPtr<ComObject<CCalvexReceiversShellFolder>> receiver =
-        MakeFolder<CCalvexReceiversShellFolder>(calvex.Get(), receiverItem.Get());
+    ComPtr<ComObject<CCalvexReceiversShellFolder>> receiver = MakeFolder<CCalvexReceiversShellFolder>(calvex.Get(), receiverItem.Get());
     int failures = 0;
 };
 
 void ShellFolderFuzzTest::Run(unsigned seed) {
-    FuzzCase random(seed, false);
-    const int folderIndex = random.Int(0, 2);
-    const bool filesLevel = folderIndex == 2;
-    FuzzCase items(seed ^ 0x9E3779B9u, filesLevel);
-    const Shape shape = static_cast<Shape>(items.Int(0, ShapeCount - 1));
-    rawpidl::Guarded list(rawpidl::Bytes(items.Items(shape)));
-    IShellFolder* folders[] = {calvex.Get(), brennor.Get(), receiver.Get()};
-    IShellFolder* folder = folders[folderIndex];
+    std::mt19937 generator(seed);
+    const int folderIndex = std::uniform_int_distribution<int>(0, 2)(generator);
+    ListMaker random(generator, folderIndex == 2);
+    const Shape shape = static_cast<Shape>(random.Int(0, ShapeCount - 1));
     const Entry entry = static_cast<Entry>(random.Int(0, EntryCount - 1));
-    std::ostringstream text;
-    text << "seed " << seed << ": " << kShapes[shape] << " list to " << kEntries[entry] << " of the "
-         << (filesLevel ? "receiver" : folderIndex ? "Brennor root" : "Calvex root") << " folder: " << list.Hex();
-    g_case = text.str();
+    rawpidl::Guarded list(rawpidl::Bytes(random.Items(shape)));
+    rawpidl::Guarded whole(rawpidl::Bytes({rawpidl::Whole(folderIndex == 2 ? ItemTypeFile : ItemTypeCalvexReceiver, L"W", 7, 40000)}));
+    IShellFolder* folders[] = {calvex.Get(), brennor.Get(), receiver.Get()};
+    const char* folderNames[] = {"Calvex root", "Brennor root", "receiver"};
+    g_case = "seed " + std::to_string(seed) + ": " + kShapes[shape] + " list to " + kEntries[entry] + " of the " +
+             folderNames[folderIndex] + " folder: " + list.Hex();
     // Whole lists must be taken, damaged ones refused; random bytes may be either.
-    const int held = shape == Whole ? 1 : shape == RandomBytes ? -1 : 0;
-    Call(random, entry, folder, list.Get(), filesLevel, held);
+    Call(random, entry, folders[folderIndex], list.Get(), whole.Get(), shape == Whole ? 1 : shape == RandomBytes ? -1 : 0);
 }
 
-void ShellFolderFuzzTest::Call(FuzzCase& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list,
-                               bool filesLevel, int held) {
-    rawpidl::Guarded other(rawpidl::Bytes({rawpidl::Whole(filesLevel ? ItemTypeFile : ItemTypeCalvexReceiver, L"W", 7, 40000)}));
-    LPCITEMIDLIST lists[] = {other.Get(), list};
+void ShellFolderFuzzTest::Call(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list,
+                               LPCITEMIDLIST whole, int held) {
+    LPCITEMIDLIST lists[] = {whole, list};
     const bool refused = held == 0;
     void* object = nullptr;
     HRESULT hr = S_OK;
-    switch (entry) {
-    case Attributes: {
+    if (entry == Attributes) {
         SFGAOF attributes = 0;
         const UINT count = static_cast<UINT>(random.Int(1, 2));  // alone, or after a whole item
         hr = folder->GetAttributesOf(count, &lists[2 - count], &attributes);
         if (held >= 0) Expect(hr == (refused ? E_INVALIDARG : S_OK) && (attributes == 0) == refused, "attributes");
-        break;
-    }
-    case Compare: {
+    } else if (entry == Compare) {
         const LPARAM column = random.Int(-3, 3);
-        const HRESULT forth = folder->CompareIDs(column, list, other.Get()), back = folder->CompareIDs(column, other.Get(), list);
+        const HRESULT forth = folder->CompareIDs(column, list, whole), back = folder->CompareIDs(column, whole, list);
         const HRESULT self = folder->CompareIDs(column, list, list);
         if (refused) Expect(forth == 1 && back == -1 && self == 0, "a damaged item sorts last");
         if (held == 1 && (column == 0 || column == 1)) Expect((forth > 0) == (back < 0), "names compare both ways alike");
-        break;
-    }
-    case DisplayName: {
+    } else if (entry == DisplayName) {
         const SHGDNF flags[] = {SHGDN_NORMAL, SHGDN_INFOLDER, SHGDN_FORPARSING, SHGDN_FORPARSING | SHGDN_INFOLDER};
         STRRET name = {};
-        hr = folder->GetDisplayNameOf(list, flags[random.Int(0, 3)], &name);
         wchar_t small[8];
+        hr = folder->GetDisplayNameOf(list, flags[random.Int(0, 3)], &name);
         if (hr == S_OK) StrRetToBufW(&name, list, small, random.Int(1, 8));
         if (held >= 0) Expect(hr == (refused ? E_INVALIDARG : S_OK), "display name");
-        break;
-    }
-    case UIObject: {
+    } else {
         const IID* iids[] = {&IID_IExtractIconW, &IID_IQueryInfo, &IID_IContextMenu, &IID_IDataObject};
-        hr = folder->GetUIObjectOf(nullptr, 1, &lists[1], *iids[random.Int(0, 3)], nullptr, &object);
+        hr = entry == Bind ? folder->BindToObject(list, nullptr, IID_IShellFolder, &object)
+                           : folder->GetUIObjectOf(nullptr, 1, &lists[1], *iids[random.Int(0, 3)], nullptr, &object);
         if (object) static_cast<IUnknown*>(object)->Release();
-        if (refused) Expect(hr == E_INVALIDARG && !object, "item object");
-        break;
-    }
-    case Bind:
-        hr = folder->BindToObject(list, nullptr, IID_IShellFolder, &object);
-        if (object) static_cast<IUnknown*>(object)->Release();
-        if (refused) Expect(hr == E_INVALIDARG && !object, "bind");
-        break;
-    case Initialize: {
-        ComPtr<ComObject<CCalvexReceiversShellFolder>> fresh;
-        CreateComObject<CCalvexReceiversShellFolder>(&fresh);
-        Expect(fresh && fresh->Initialize(list) == S_OK, "Initialize takes any list and reads none of it");
-        break;
-    }
-    default: break;
+        if (refused) Expect(hr == E_INVALIDARG && !object, "item object or bind");
     }
 }
 }  // namespace

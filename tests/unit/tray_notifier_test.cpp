@@ -17,20 +17,23 @@ TEST(TrayNotifierTest, SpeaksOfNewsOnly) {
     console.SetLog(log);
     ULONGLONG now = 1000000;
     TrayNotifier notifier(console, L"C:\\Survey", nullptr, [&] { return now; });
-    struct Step { ULONGLONG after; const wchar_t* receiver; int files; bool unplugged, said; } steps[] = {
-        {0, L"Q9 GNSS@USB", 12, false, true},       // plugged in
-        {60000, L"Q9 GNSS@USB", 12, false, false},  // the full comparison a minute later
-        {5000, L"R2/Net@COM4", 2, false, true},     // another receiver
-        {5000, L"Q9 GNSS@USB", 13, false, true},    // a file logged
-        {60000, L"Q9 GNSS@USB", 13, false, false},
-        {95000, L"Q9 GNSS@USB", 13, false, true},   // not seen for longer than a comparison: replugged
-        {1000, L"Q9 GNSS@USB", 13, true, true},     // unplugged during a pass
-        {20000, L"Q9 GNSS@USB", 13, false, true},   // back: the same words are news again
+    struct Step { ULONGLONG after; const wchar_t* receiver; int files, fetched, deleted; bool unplugged, said; } steps[] = {
+        {0, L"Q9 GNSS@USB", 12, 0, 0, false, true},       // plugged in, all there already
+        {60000, L"Q9 GNSS@USB", 12, 0, 0, false, false},  // the full comparison a minute later
+        {5000, L"R2/Net@COM4", 2, 2, 2, false, true},     // another receiver, moved
+        {2000, L"R2/Net@COM4", 0, 0, 0, false, false},    // the look after its deletes: empty
+        {5000, L"Q9 GNSS@USB", 13, 1, 0, false, true},    // a file logged
+        {5000, L"Q9 GNSS@USB", 13, 1, 0, false, false},   // fetched again as it grows: the same words
+        {60000, L"Q9 GNSS@USB", 13, 0, 0, false, false},
+        {95000, L"Q9 GNSS@USB", 13, 0, 0, false, true},   // not seen for longer than a comparison: replugged
+        {1000, L"Q9 GNSS@USB", 13, 0, 0, true, true},     // unplugged during a pass
+        {20000, L"Q9 GNSS@USB", 13, 0, 0, false, true},   // back: the same words are news again
     };
     std::string expected;
     for (const Step& step : steps) {
         ReceiverPass pass;
         pass.receiver = step.receiver, pass.target = L"C:\\Survey", pass.files = step.files, pass.unplugged = step.unplugged;
+        pass.fetched = step.fetched, pass.deleted = step.deleted;
         now += step.after;
         notifier.PassEnded(pass);
         if (step.said) expected += Narrow(PassNotice(pass)) + "\r\n";

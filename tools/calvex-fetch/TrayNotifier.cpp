@@ -29,7 +29,10 @@ void TrayNotifier::PassEnded(const ReceiverPass& pass) {
 bool TrayNotifier::IsNews(const ReceiverPass& pass, const std::wstring& notice) {
     const ULONGLONG now = m_clock();
     auto found = m_said.find(pass.receiver);
-    const bool news = found == m_said.end() || found->second.notice != notice || now - found->second.at > kAwayMs;
+    // A pass that did nothing tells nothing new of a receiver heard of lately: the full comparison
+    // every minute, or the look that follows the deletes of a --move, which find it empty.
+    const bool quiet = !pass.fetched && !pass.deleted && !pass.failed && !pass.kept && !pass.unplugged;
+    const bool news = found == m_said.end() || now - found->second.at > kAwayMs || (!quiet && found->second.notice != notice);
     // Unplugged: whatever it brings when it is back is news.
     if (pass.unplugged) m_said.erase(pass.receiver);
     else m_said[pass.receiver] = {notice, now};

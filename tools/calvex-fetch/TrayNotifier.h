@@ -3,8 +3,9 @@
 // console and the log, and a balloon of the notification area icon, if there is one), and the
 // icon's tooltip while it works. A pass that brings no news of its receiver says nothing: the
 // full comparison every minute and a receiver still logging would otherwise repeat the same
-// words all day. News is a notice other than the last one of that receiver, or any notice of a
-// receiver not heard of for longer than a full comparison takes to come round (plugged in again).
+// words all day. News is a pass that did something and says other than the last one of that
+// receiver, or any pass of a receiver not heard of for longer than a full comparison takes to
+// come round (plugged in again) or unplugged since.
 #include <windows.h>
 
 #include <functional>
