@@ -3,7 +3,9 @@
 # AutoFetch (and the simulated device manager's sample receivers) into a prefix made afresh;
 # then a logon (Wine runs the Run values when wineboot starts a session): every sample file
 # lands in FETCHDIR once with nothing partial, a log says what happened, a file logged while
-# the device manager restarts comes too; after /x a logon starts no watch.
+# the device manager restarts comes too; installed again with FETCHMOVE and FETCHLAYOUT, the
+# next logon moves every file into its place and empties the receivers; after /x a logon
+# starts no watch.
 # Guards against a logon value that does not start, quotes or points wrongly, a watch that
 # needs a console, and a removal that leaves the watch starting at each logon.
 set -u
@@ -48,6 +50,21 @@ cmp -s "$installed/sample-receivers/Calvex Q9 USB/LOG0099" "$survey/Q9 GNSS@USB/
 [ -z "$(find "$survey" -name '*.calvex-partial')" ] || bad "partial files: $(find "$survey" -name '*.calvex-partial')"
 tr -d '\r' <"$wlog"
 
+# The routine finished: installed again with FETCHMOVE and FETCHLAYOUT, the next logon files
+# every receiver's files by brand and receiver, empties each receiver once every copy is whole,
+# and says so per receiver.
+wineserver -k; wineserver -w
+"$run" msiexec /i "$msi" /qn ADDLOCAL=ALL FETCHMOVE=1 'FETCHLAYOUT={brand}\{receiver}' || bad "msiexec /i with FETCHMOVE ended with $?"
+left() { find "$installed/sample-receivers" -type f ! -name receiver.ini | wc -l; }
+unlisted=$(($(left) - expected - 1))  # a receiver without a label is not listed: its file stays
+logon
+for _ in $(seq 1 900); do [ "$(left)" = $unlisted ] && break; sleep 0.1; done
+[ "$(left)" = $unlisted ] || bad "$(($(left) - unlisted)) files still on the listed receivers after the logon with FETCHMOVE=1"
+moved=$(find "$survey/Calvex" "$survey/Brennor" -type f ! -name '*.calvex-partial' 2>/dev/null | wc -l)
+[ "$moved" = $((expected + 1)) ] || bad "$moved of $((expected + 1)) files filed by brand and receiver"
+cmp -s "$survey/Q9 GNSS@USB/LOG0099.qpr" "$survey/Calvex/Q9 GNSS@USB/LOG0099.qpr" || bad "LOG0099 filed wrongly"
+waitfor "$wlog" "Q9 GNSS@USB: 8 files in C:\Survey, 8 deleted from the receiver. Safe to unplug." 30
+
 # Removed: the logon value goes, the fetched files and the log stay, a logon starts nothing.
 "$run" msiexec /x "$msi" /qn || bad "msiexec /x ended with $?"
 logon
@@ -56,5 +73,5 @@ watching && bad "a watch still starts at logon after the removal"
 [ -f "$wlog" ] && [ -f "$survey/Q9 GNSS@USB/LOG0099.qpr" ] || bad "the removal took the fetched files or the log"
 wineserver -k || true
 rm -rf "$WINEPREFIX"
-[ $fail -eq 0 ] && echo "PASS: installed, a logon fetched $expected files and one more through a restart; removed, nothing starts"
+[ $fail -eq 0 ] && echo "PASS: installed, a logon fetched $expected files and one more through a restart; with FETCHMOVE every receiver emptied into its place; removed, nothing starts"
 exit $fail
