@@ -310,14 +310,13 @@ HRESULT IReceiversShellFolderImpl::CreateView(REFIID riid, void** ppv) {
 STDMETHODIMP IReceiversShellFolderImpl::GetAttributesOf(UINT cidl, PCUITEMID_CHILD_ARRAY apidl, SFGAOF* rgfInOut) {
     TraceA("IReceiversShellFolderImpl::GetAttributesOf\r\n");
     if (!rgfInOut) return S_FALSE;
-    for (UINT i = 0; i < cidl && apidl && m_pidlMgr; ++i) {
-        if (IsHeld("GetAttributesOf", apidl[i])) continue;
-        *rgfInOut = 0;  // nothing may be done with it
-        return E_INVALIDARG;
-    }
     // The caller's mask is replaced, not narrowed.
     *rgfInOut = 0xFFFFFFFF;
     for (UINT i = 0; i < cidl && apidl && m_pidlMgr; ++i) {
+        if (!IsHeld("GetAttributesOf", apidl[i])) {
+            *rgfInOut = 0;  // nothing may be done with it
+            return E_INVALIDARG;
+        }
         const DWORD type = m_pidlMgr->GetLastItemType(apidl[i]);
         *rgfInOut &= IsFileType(type) ? kFileAttributes : IsReceiverType(type) ? kReceiverAttributes : kRootAttributes;
     }
