@@ -27,13 +27,10 @@ std::wstring Duration(ULONGLONG milliseconds) {
 }
 }  // namespace
 
-ReceiverWatch::ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
-                             const std::atomic<bool>& interrupted, HANDLE stop)
-    : m_options(options), m_target(target), m_console(console), m_interrupted(interrupted), m_stop(stop),
-      m_listener([this](LONG, PCIDLIST_ABSOLUTE item) { OnChange(item); }) {
-    std::wstring error;
-    m_layout.Parse(options.layout, error);
-}
+ReceiverWatch::ReceiverWatch(const FetchOptions& options, const LayoutPattern& layout, const std::wstring& target,
+                             FetchConsole& console, const std::atomic<bool>& interrupted, HANDLE stop)
+    : m_options(options), m_layout(layout), m_target(target), m_console(console), m_interrupted(interrupted),
+      m_stop(stop), m_listener([this](LONG, PCIDLIST_ABSOLUTE item) { OnChange(item); }) {}
 
 int ReceiverWatch::Run() {
     if (!Start()) return 2;

@@ -22,10 +22,10 @@
 
 class ReceiverWatch {
 public:
-    // interrupted and stop are set by the console's Ctrl+C handler. options.layout has been
-    // parsed once already (bad patterns are refused before a watch starts).
-    ReceiverWatch(const FetchOptions& options, const std::wstring& target, FetchConsole& console,
-                  const std::atomic<bool>& interrupted, HANDLE stop);
+    // interrupted and stop are set by the console's Ctrl+C handler; layout is options.layout,
+    // parsed before the watch starts (a bad pattern never gets this far).
+    ReceiverWatch(const FetchOptions& options, const LayoutPattern& layout, const std::wstring& target,
+                  FetchConsole& console, const std::atomic<bool>& interrupted, HANDLE stop);
 
     // Who hears where the watch stands, on this thread; null: nobody.
     void SetObserver(WatchObserver* observer) { m_observer = observer; }
@@ -63,6 +63,7 @@ private:
     std::wstring Summary() const;
 
     const FetchOptions& m_options;
+    const LayoutPattern& m_layout;
     const std::wstring m_target;
     FetchConsole& m_console;
     const std::atomic<bool>& m_interrupted;
@@ -76,7 +77,6 @@ private:
     bool m_gone = false;
     std::map<std::wstring, Watched> m_watched;  // by brand and key
     FetchTotals m_totals;
-    LayoutPattern m_layout;
     WatchObserver* m_observer = nullptr;
     bool m_idle = false;  // Idle told, and no work since
     ULONGLONG m_started = 0;

@@ -142,13 +142,13 @@ std::wstring Summary(const FetchOptions& options, const FetchTotals& totals, ULO
 
 // The windowless watch has an icon in the notification area unless told not to (--no-notify);
 // the console build has its console. Either way the notices are lines of the console and log.
-int Watch(const FetchOptions& options, const std::wstring& target, FetchConsole& console) {
+int Watch(const FetchOptions& options, const LayoutPattern& layout, const std::wstring& target, FetchConsole& console) {
     std::unique_ptr<TrayIcon> icon;
 #ifdef CALVEX_WINDOWLESS
     if (options.notify) icon.reset(new TrayIcon(IdleTip(target)));
 #endif
     TrayNotifier notifier(console, target, icon.get());
-    ReceiverWatch watch(options, target, console, g_interrupted, g_stop);
+    ReceiverWatch watch(options, layout, target, console, g_interrupted, g_stop);
     watch.SetObserver(&notifier);
     return watch.Run();
 }
@@ -172,7 +172,7 @@ int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchConsole
     }
     if (options.watch) {
         console.SetStamped(true);
-        return Watch(options, target, console);
+        return Watch(options, layout, target, console);
     }
     std::vector<Receiver> receivers;
     const HRESULT hr = ListReceivers(options, receivers);
