@@ -16,6 +16,13 @@ source "$(dirname "$0")/lib.sh"
 fail=0
 stamp=1793000000  # late October: daylight saving time in the tests' zone, which has left by now
 
+# With no receiver plugged in, a batch run has nothing to do: exit code 2 and the reason.
+"$run" "$build/CalvexDeviceSim.exe" /Quit
+"$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$away")" /f >/dev/null 2>&1
+"$run" "$build/calvex-fetch.exe" "$(win "$target")" >/dev/null 2>"$work/err.txt"; status=$?
+[ $status -eq 2 ] || bad "a batch run without receivers ended with $status"
+grep -qx "calvex-fetch: no receiver is connected" <(tr -d '\r' <"$work/err.txt") || bad "without receivers: $(cat "$work/err.txt")"
+
 receiver "$root/Calvex A" 1 1000-0001 A
 log "$root/Calvex A" LOG0001 3000
 receiver "$root/Calvex B" 1 1000-0002 B
@@ -78,6 +85,38 @@ cat "$out.2" >>"$out"
 # Every file the receivers hold, once (the two changed while away twice), whole, with its time,
 # and nothing else.
 landed "$out" "Calvex B/LOG0001" "Calvex B/LOG0003"
+
+# A file that fails is tried once more at once, then given up: a file logged later on its receiver
+# does not bring it back. A watch that saw a failure ends with 1. A batch stopped by Ctrl+C
+# discards the download in progress, goes no further and ends with 1.
+"$run" "$build/CalvexDeviceSim.exe" /Quit
+failing=$work/failing
+receiver "$failing/Calvex F" 1 1000-0009 F
+printf 'FailAtPercent=50\r\n' >>"$failing/Calvex F/receiver.ini"
+log "$failing/Calvex F" BAD1 20000
+receiver "$failing/Calvex G" 1 1000-0010 G
+log "$failing/Calvex G" BIG 200000
+log "$failing/Calvex G" SMALL 1000
+"$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$failing")" /f >/dev/null 2>&1
+"$run" "$build/calvex-fetch.exe" --receiver G@USB "$(win "$work/batch")" >"$out.4" 2>/dev/null &
+tool=$!
+root=$failing downloading "Calvex G" BIG && sleep 1
+kill -INT $tool
+ends $tool 10; status=$?
+[ $status -eq 1 ] || bad "exit code $status of a batch stopped by Ctrl+C"
+grep -qF "discarded   BIG.qpr (stopped)" "$out.4" && grep -q " (interrupted)$" <(tr -d '\r' <"$out.4") || bad "a batch stopped: $(cat "$out.4")"
+[ -z "$(find "$work/batch" -type f)" ] || bad "a stopped batch left: $(find "$work/batch" -type f)"
+"$run" "$build/calvex-fetch.exe" --watch --brand calvex "$(win "$work/watched")" >"$out.4" 2>/dev/null &
+tool=$!
+waitfor "$out.4" "FAILED      F@USB\\BAD1.qpr" 30 2
+log "$failing/Calvex F" BAD2 20000
+waitfor "$out.4" "FAILED      F@USB\\BAD2.qpr" 30
+sleep 2
+kill -INT $tool
+ends $tool 10; status=$?
+[ $status -eq 1 ] || bad "exit code $status of a watch that saw files fail"
+[ "$(grep -c "trying once more" "$out.4")" = 1 ] && [ "$(grep -cF 'FAILED      F@USB\BAD1.qpr' "$out.4")" = 2 ] ||
+  bad "tried more or less than twice: $(cat "$out.4")"
 
 # --move with a layout: every file is fetched again into its new place and deleted on the
 # receiver, and so is one logged while watching. The copies made above are the reference.

@@ -34,7 +34,12 @@ log "$root/Brennor C" LOG0001 4000
 "$run" "$build/calvex-fetchw.exe" --watch --log "$(win "$wlog")" "$(win "$target")" >"$work/out.txt" 2>&1 &
 tool=$!
 waitfor "$wlog" "no device manager: it cannot be started (0x80040154): waiting for it" 30
-waitfor "$wlog" "no device manager yet (0x80040154)" 15
+waitfor "$wlog" "no device manager yet (0x80040154)" 20 2
+# It asked again 2 s, then 4 s later, by the times of its lines.
+pauses=$(tr -d '\r' <"$wlog" | awk '{ split($1, t, ":"); s = t[1] * 3600 + t[2] * 60 + t[3] }
+  asked != "" { printf "%s:%d ", asked, s - since; asked = "" }
+  / trying the device manager again in / { asked = $(NF - 1); since = s }')
+case "$pauses" in "2:"[234]" 4:"[456]" "*) ;; *) bad "pauses before asking again (asked:seconds): $pauses" ;; esac
 "$run" "$build/CalvexDeviceSim.exe" /RegServer
 waitfor "$wlog" "the device manager is back: every receiver is compared in full" 30
 waitfor "$wlog" "fetched     A@USB\\LOG0001" 60
@@ -51,21 +56,28 @@ ends $! 30; status=$?
 [ $status -eq 2 ] || bad "a second watch ended with $status"
 grep -qE "^[0-9:]{8} $(printf '%s' "$refusal" | sed 's/[\\.]/\\&/g')" "$target/calvex-fetch.log" ||
   bad "the second watch's log: $(cat "$target/calvex-fetch.log")"
-"$run" "$build/calvex-fetch.exe" "$(win "$target")\\" >/dev/null 2>"$work/batch.err"; status=$?
-[ $status -eq 2 ] || bad "a batch run into the watched folder ended with $status"
-grep -qF "$refusal" "$work/batch.err" || bad "the batch run's stderr: $(cat "$work/batch.err")"
+"$run" "$build/calvex-fetch.exe" "$(win "$target" | tr a-z A-Z)\\" >/dev/null 2>"$work/batch.err"; status=$?
+[ $status -eq 2 ] || bad "a batch run into the watched folder, in capitals, ended with $status"
+grep -qiF "$refusal" "$work/batch.err" || bad "the batch run's stderr: $(cat "$work/batch.err")"
+# A dry run writes nothing: it is let through.
+"$run" "$build/calvex-fetch.exe" --dry-run "$(win "$target")" >/dev/null 2>&1; status=$?
+[ $status -eq 0 ] || bad "a dry run into the watched folder ended with $status"
 kill -0 $tool 2>/dev/null || bad "the first watch did not run on"
 # Without a console, what stops it before the target's log is open is said where the user looks.
 fallback=$(echo "$prefix"/drive_c/users/*/AppData/Local)/calvex-fetch.log
 rm -f "$fallback"
 "$run" "$build/calvex-fetchw.exe" --watch --bogus "$(win "$target")" >/dev/null 2>&1; status=$?
 [ $status -eq 2 ] || bad "a mistyped option ended with $status"
-grep -q "^[0-9:]\{8\} calvex-fetch: unknown option --bogus" "$fallback" || bad "the fallback log: $(cat "$fallback")"
+touch "$work/a-file"
+"$run" "$build/calvex-fetchw.exe" --watch "$(win "$work/a-file")" >/dev/null 2>&1; status=$?
+[ $status -eq 2 ] || bad "a target that is a file ended with $status"
+grep -q "^[0-9:]\{8\} calvex-fetch: unknown option --bogus" "$fallback" &&
+  grep -qF "calvex-fetch: target not writable: $(win "$work/a-file")" "$fallback" || bad "the fallback log: $(cat "$fallback")"
 rm -f "$target/calvex-fetch.log"
 
 # The device manager quits (a service restart); files logged meanwhile come once it is back.
 "$run" "$build/CalvexDeviceSim.exe" /Quit
-waitfor "$wlog" "the device manager is gone (0x" 15
+waitfor "$wlog" "the device manager is gone (0x" 6  # it asks every 2 s
 log "$root/Calvex A" LOG0002 5000
 log "$root/Brennor C" LOG0002 6000
 waitfor "$wlog" "the device manager is back: every receiver is compared in full" 40 2

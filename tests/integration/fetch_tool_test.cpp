@@ -164,7 +164,8 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
         EXPECT_EQ(0, run.Count(" fetched, ")) << run.out;
     }
     EXPECT_EQ(std::vector<std::wstring>{L"a-file"}, ListFiles(target.Path()));
-    EXPECT_FALSE(FileExists(fresh)) << "a bad layout touches nothing, not even the target";
+    EXPECT_EQ(0u, RunFetch(L"--dry-run " + Quoted(fresh)).exitCode);
+    EXPECT_FALSE(FileExists(fresh)) << "a bad layout or a dry run touches nothing, not even the target";
 }
 
 TEST_F(FetchToolTest, FailedDownloadLeavesNoFileAndExitsOne) {

@@ -10,18 +10,28 @@ UniqueFile OpenForAppend(const std::wstring& path) {
     return UniqueFile(CreateFileW(path.c_str(), FILE_APPEND_DATA, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
                                   nullptr, OPEN_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr));
 }
-}  // namespace
 
-std::wstring LocalTimeText(bool date) {
-    SYSTEMTIME now;
-    GetLocalTime(&now);
+std::wstring TimeText(const SYSTEMTIME& now, bool date) {
     wchar_t text[16];
     if (date) swprintf(text, 16, L"%04u-%02u-%02u", now.wYear, now.wMonth, now.wDay);
     else swprintf(text, 16, L"%02u:%02u:%02u ", now.wHour, now.wMinute, now.wSecond);
     return text;
 }
+}  // namespace
+
+std::wstring LocalTimeText(bool date) {
+    SYSTEMTIME now;
+    GetLocalTime(&now);
+    return TimeText(now, date);
+}
 
 void FetchLog::Write(const std::wstring& line) {
+    SYSTEMTIME now;
+    GetLocalTime(&now);
+    Write(line, now);
+}
+
+void FetchLog::Write(const std::wstring& line, const SYSTEMTIME& now) {
     if (m_path.empty()) return;
     UniqueFile file = OpenForAppend(m_path);
     LARGE_INTEGER size = {};
@@ -32,12 +42,11 @@ void FetchLog::Write(const std::wstring& line) {
         m_day = 0;
     }
     if (!file) return;
-    SYSTEMTIME now;
-    GetLocalTime(&now);
     // Lines carry the time of day only, as on the console: the date is said once a day.
-    const std::wstring date = m_day != now.wDay ? L"---- " + LocalTimeText(true) + L" ----\r\n" : L"";
+    const DWORD day = now.wYear * 10000u + now.wMonth * 100u + now.wDay;
+    const std::wstring date = m_day != day ? L"---- " + TimeText(now, true) + L" ----\r\n" : L"";
     const std::string bytes = Utf8(date + line + L"\r\n");
-    m_day = now.wDay;
+    m_day = day;
     DWORD written = 0;
     WriteFile(file.Get(), bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr);
 }

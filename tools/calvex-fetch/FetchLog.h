@@ -18,8 +18,10 @@ public:
     const std::wstring& Path() const { return m_path; }
     // One line, UTF-8, ending in CR LF; a line that cannot be written is lost, not retried.
     void Write(const std::wstring& line);
+    // The same, written at the local time now: the day decides the date lines.
+    void Write(const std::wstring& line, const SYSTEMTIME& now);
 
 private:
     std::wstring m_path;
-    WORD m_day = 0;  // the day of the last line, so that a new day gets a line of its date
+    DWORD m_day = 0;  // the date of the last line (yyyymmdd), so that a new day gets a line of its date
 };

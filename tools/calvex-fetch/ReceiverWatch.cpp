@@ -10,10 +10,6 @@ namespace {
 // dialog asks as often), and how often everything is compared in case a notification was lost.
 constexpr ULONGLONG kLivenessMs = 2000;
 constexpr ULONGLONG kRescanMs = 60000;
-// Pauses before each new try while the device manager is away: soon after a restart, then
-// once a minute for as long as it takes.
-constexpr ULONGLONG kRetrySeconds[] = {2, 4, 8, 16, 30, 60};
-constexpr size_t kRetrySteps = sizeof(kRetrySeconds) / sizeof(kRetrySeconds[0]);
 
 std::wstring WatchId(int brand, const std::wstring& key) { return std::to_wstring(brand) + L"|" + key; }
 int BrandOf(const std::wstring& id) { return id[0] - L'0'; }
@@ -26,6 +22,13 @@ std::wstring Duration(ULONGLONG milliseconds) {
     return text;
 }
 }  // namespace
+
+// Soon after a restart, then once a minute for as long as it takes.
+ULONGLONG ReconnectPauseSeconds(size_t attempt) {
+    constexpr ULONGLONG kPauses[] = {2, 4, 8, 16, 30, 60};
+    constexpr size_t kSteps = sizeof(kPauses) / sizeof(kPauses[0]);
+    return kPauses[attempt < kSteps ? attempt : kSteps - 1];
+}
 
 ReceiverWatch::ReceiverWatch(const FetchOptions& options, const LayoutPattern& layout, const std::wstring& target,
                              FetchConsole& console, const std::atomic<bool>& interrupted, HANDLE stop)
@@ -122,7 +125,7 @@ void ReceiverWatch::Reconnect() {
     for (ComPtr<IShellFolder>& brand : m_brands) brand.Reset();
     m_manager.Reset();
     for (size_t attempt = 0; !m_interrupted; ++attempt) {
-        const ULONGLONG pause = kRetrySeconds[attempt < kRetrySteps ? attempt : kRetrySteps - 1];
+        const ULONGLONG pause = ReconnectPauseSeconds(attempt);
         m_console.Line(L"trying the device manager again in " + std::to_wstring(pause) + L" s");
         Pause(pause * 1000);
         if (m_interrupted) return;

@@ -20,6 +20,9 @@
 #include "ReceiverPass.h"
 #include "ShellChangeListener.h"
 
+// The pause before the attempt-th new try (from 0) while the device manager is away.
+ULONGLONG ReconnectPauseSeconds(size_t attempt);
+
 class ReceiverWatch {
 public:
     // interrupted and stop are set by the console's Ctrl+C handler; layout is options.layout,
