@@ -86,8 +86,8 @@ cat "$out.2" >>"$out"
 # and nothing else.
 landed "$out" "Calvex B/LOG0001" "Calvex B/LOG0003"
 
-# A file that fails is tried once more at once, then given up: a file logged later on its receiver
-# does not bring it back. A watch that saw a failure ends with 1. A batch stopped by Ctrl+C
+# A file that fails is tried once more at once, then given up until the full comparison a minute
+# on: a file logged later on its receiver does not bring it back. A watch that saw a failure ends with 1. A batch stopped by Ctrl+C
 # discards the download in progress, goes no further and ends with 1.
 "$run" "$build/CalvexDeviceSim.exe" /Quit
 failing=$work/failing
@@ -106,17 +106,24 @@ ends $tool 10; status=$?
 [ $status -eq 1 ] || bad "exit code $status of a batch stopped by Ctrl+C"
 grep -qF "discarded   BIG.qpr (stopped)" "$out.4" && grep -q " (interrupted)$" <(tr -d '\r' <"$out.4") || bad "a batch stopped: $(cat "$out.4")"
 [ -z "$(find "$work/batch" -type f)" ] || bad "a stopped batch left: $(find "$work/batch" -type f)"
+# Ended hard (the Task Manager): the file in progress is not under its name.
+"$run" "$build/calvex-fetch.exe" --receiver G@USB "$(win "$work/batch")" >/dev/null 2>&1 &
+tool=$!
+root=$failing downloading "Calvex G" BIG && sleep 1
+kill -9 $tool; wait $tool
+[ -e "$work/batch/G@USB/BIG.qpr" ] && bad "a download ended hard looks complete"
 "$run" "$build/calvex-fetch.exe" --watch --brand calvex "$(win "$work/watched")" >"$out.4" 2>/dev/null &
 tool=$!
 waitfor "$out.4" "FAILED      F@USB\\BAD1.qpr" 30 2
 log "$failing/Calvex F" BAD2 20000
 waitfor "$out.4" "FAILED      F@USB\\BAD2.qpr" 30
-sleep 2
+# Tried again at the full comparison, a minute after the start.
+waitfor "$out.4" "FAILED      F@USB\\BAD1.qpr" 75 3
 kill -INT $tool
 ends $tool 10; status=$?
 [ $status -eq 1 ] || bad "exit code $status of a watch that saw files fail"
-[ "$(grep -c "trying once more" "$out.4")" = 1 ] && [ "$(grep -cF 'FAILED      F@USB\BAD1.qpr' "$out.4")" = 2 ] ||
-  bad "tried more or less than twice: $(cat "$out.4")"
+[ "$(grep -c "trying once more" "$out.4")" = 1 ] && [ "$(grep -cF 'FAILED      F@USB\BAD1.qpr' "$out.4")" = 3 ] ||
+  bad "not tried twice, then once a minute: $(cat "$out.4")"
 
 # --move with a layout: every file is fetched again into its new place and deleted on the
 # receiver, and so is one logged while watching. The copies made above are the reference.

@@ -96,6 +96,8 @@ TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
         {"repair", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
         {"repair, moving off", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHMOVE=0", kExtensionAndSimulator, L"C:\\Survey data",
          false, byDate + 7},
+        {"repair, the plain layout again", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHLAYOUT={receiver}", kExtensionAndSimulator,
+         L"C:\\Survey data", false, L" --layout \"{receiver}\""},
         {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
         {"uninstall", L"/x", kNothing, nullptr, false},
         {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product

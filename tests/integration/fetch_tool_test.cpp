@@ -43,9 +43,12 @@ TEST_F(FetchToolTest, FetchesEverySampleFileWhole) {
                              Quoted(device.Path())));
     DeviceSimScope scope(device.Path());
 
-    const FetchRun first = RunFetch(Quoted(target.Path()));
+    TempDirectory logs(L"calvex-fetch-log");
+    const FetchRun first = RunFetch(L"--log " + Quoted(logs.Path() + L"\\fetch.log") + L" " + Quoted(target.Path()));
     ASSERT_EQ(0u, first.exitCode) << first.out << first.err;
     EXPECT_EQ(1, first.Count("22 fetched, 0 skipped, 0 failed, 4.0 MB in ")) << first.out;
+    EXPECT_EQ(1, first.Count(Narrow(L"  fetched     \u00C5\u00C4\u00D6-\u6F22\u5B57.T02  8.8 KB"))) << "UTF-8 through a pipe";
+    EXPECT_EQ(22, CountOf(ReadFileBytes(logs.Path() + L"\\fetch.log"), "  fetched     ")) << "--log of the console tool";
     const std::pair<const wchar_t*, const wchar_t*> arrived[] = {  // fetched, on the device
         {L"Q9 GNSS@USB\\LOG0001.qpr", L"Calvex Q9 USB\\LOG0001"}, {L"R2_Net@COM4\\LOG0002", L"Brennor R2 COM4\\LOG0002"},
         {L"Compact \u00DC_2@USB\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02", L"Brennor odd names\\\u00C5\u00C4\u00D6-\u6F22\u5B57.T02"},
@@ -120,6 +123,9 @@ TEST_F(FetchToolTest, FetchesAgainWhatChangedOnTheDevice) {
             EXPECT_EQ(WriteTime(device + name), WriteTime(fetched + name + L".qpr")) << Narrow(name) << ": the device's time";
         }
     }
+    const FetchRun quiet = RunFetch(Quoted(target.Path()));
+    EXPECT_EQ(0u, quiet.exitCode) << "nothing new is all good";
+    EXPECT_EQ(static_cast<int>(names.size()), quiet.Count("  up to date  ")) << quiet.out;
 }
 
 // Registered again however the test ends.
@@ -165,6 +171,7 @@ TEST_F(FetchToolTest, NothingDoneExitsTwoWithTheReason) {
     }
     EXPECT_EQ(std::vector<std::wstring>{L"a-file"}, ListFiles(target.Path()));
     EXPECT_EQ(0u, RunFetch(L"--dry-run " + Quoted(fresh)).exitCode);
+    EXPECT_EQ(0u, RunFetch(L"--bogus").out.find("usage: calvex-fetch [--brand calvex|brennor|all] "));
     EXPECT_FALSE(FileExists(fresh)) << "a bad layout or a dry run touches nothing, not even the target";
 }
 

@@ -105,6 +105,9 @@ TEST(ShellFolderLifetime, UnregisteredDeviceManagerLetsARememberedReceiverBindAn
     LoadedModule module;
     Opened opened = Open(module, CLSID_BrennorReceiversShellFolder, 0);
     ASSERT_TRUE(opened.root);
+    HRESULT listed = E_FAIL;
+    EXPECT_TRUE(ListItems(opened.root.Get(), SHCONTF_FOLDERS, &listed).empty()) << "an empty brand folder";
+    EXPECT_EQ(S_OK, listed);
     LPITEMIDLIST remembered = nullptr;
     std::wstring key = L"5302-00871!Q9 GNSS!USB";
     ASSERT_EQ(S_OK, opened.root->ParseDisplayName(nullptr, nullptr, &key[0], nullptr, &remembered, nullptr));
@@ -112,7 +115,7 @@ TEST(ShellFolderLifetime, UnregisteredDeviceManagerLetsARememberedReceiverBindAn
     ComPtr<IShellFolder> receiver;
     EXPECT_EQ(S_OK, opened.root->BindToObject(remembered, nullptr, IID_IShellFolder, receiver.PutVoid()));
     ASSERT_TRUE(receiver);
-    HRESULT listed = E_FAIL;
+    listed = E_FAIL;
     EXPECT_TRUE(ListItems(receiver.Get(), SHCONTF_NONFOLDERS, &listed).empty());
     EXPECT_EQ(S_OK, listed);
 }

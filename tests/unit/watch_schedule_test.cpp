@@ -52,10 +52,11 @@ TEST(WatchScheduleTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
         EXPECT_EQ(expected, ReadFileBytes(path)) << Narrow(step.line);
     }
     // One byte short of the limit the next line still goes in; the one after begins a new file.
-    Append(path, std::string(kLogLimit - 1 - expected.size(), 'x'));
+    const size_t mebibyte = 1024 * 1024;
+    Append(path, std::string(mebibyte - 1 - expected.size(), 'x'));
     restarted.Write(L"f", At(4, 8, 12, 2));
     const std::string full = ReadFileBytes(path);
-    EXPECT_EQ(kLogLimit + 2, full.size());
+    EXPECT_EQ(mebibyte + 2, full.size());
     restarted.Write(L"g", At(4, 8, 12, 3));
     EXPECT_EQ(full, ReadFileBytes(path + L".1")) << "the full log replaces the older one";
     EXPECT_EQ("---- 2026-04-08 ----\r\ng\r\n", ReadFileBytes(path));
