@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
-# check_imports.sh DLL: the module exports exactly its four entry points and imports
-# nothing but Windows system DLLs (the C and C++ runtimes are linked in statically).
+# check_imports.sh DLL [WINDOWLESS_EXE]: the module exports exactly its four entry points and
+# imports nothing but Windows system DLLs (the C and C++ runtimes are linked in statically); the
+# tool started at logon is a Windows program, so no console flashes up.
 set -euo pipefail
 dll=$1
 dump=$(x86_64-w64-mingw32-objdump -p "$dll")
@@ -13,6 +14,9 @@ done
 exports=$(awk '/\[Ordinal\/Name Pointer\] Table/{on=1;next} on&&/^[ \t]*\[/{print $NF} on&&/^$/{exit}' <<<"$dump" | sort | tr '\n' ' ')
 if [ "$exports" != "DllCanUnloadNow DllGetClassObject DllRegisterServer DllUnregisterServer " ]; then
   echo "FAIL: exports are: $exports"; status=1
+fi
+if [ $# -gt 1 ] && ! grep -qE '^Subsystem\s+0+2\s' <<<"$(x86_64-w64-mingw32-objdump -p "$2")"; then
+  echo "FAIL: $(basename "$2") is not a Windows program (it would open a console)"; status=1
 fi
 echo "imports: $(tr '\n' ' ' <<<"$imports")"
 echo "exports: $exports"

@@ -1,23 +1,21 @@
-// Guards the watch's promises of time and size without waiting for them: the pauses before the
-// device manager is asked again, a date line in the log at each start and each new day, and the
-// log turned into NAME.1 (replacing an older one) once it holds 1 MiB.
+// Guards what the unattended fetch promises, without waiting or a second user: the pauses before
+// the device manager is asked again, a date line in the log at each start and each new day, the
+// log turned into NAME.1 (replacing an older one) once it holds 1 MiB, and one fetch per folder
+// however the folder is spelt and whichever user runs it.
 #include <windows.h>
 
 #include <gtest/gtest.h>
 
 #include "FetchLog.h"
 #include "ReceiverWatch.h"
+#include "TargetLock.h"
 #include "com/Handles.h"
 #include "support/TestSupport.h"
 
 using namespace testsupport;
 
 namespace {
-SYSTEMTIME At(WORD month, WORD day, WORD hour, WORD minute) {
-    SYSTEMTIME time = {};
-    time.wYear = 2026, time.wMonth = month, time.wDay = day, time.wHour = hour, time.wMinute = minute;
-    return time;
-}
+SYSTEMTIME At(WORD month, WORD day, WORD hour, WORD minute) { return {2026, month, 0, day, hour, minute, 0, 0}; }
 
 void Append(const std::wstring& path, const std::string& bytes) {
     UniqueFile file(CreateFileW(path.c_str(), FILE_APPEND_DATA, 0, nullptr, OPEN_ALWAYS, 0, nullptr));
@@ -26,13 +24,12 @@ void Append(const std::wstring& path, const std::string& bytes) {
 }
 }  // namespace
 
-TEST(WatchScheduleTest, DeviceManagerIsAskedAgainAfter2_4_8_16_30SecondsThenOnceAMinute) {
-    const ULONGLONG pauses[] = {2, 4, 8, 16, 30, 60, 60, 60};
-    for (size_t attempt = 0; attempt < 8; ++attempt) EXPECT_EQ(pauses[attempt], ReconnectPauseSeconds(attempt)) << attempt;
-    EXPECT_EQ(60u, ReconnectPauseSeconds(100000));
+TEST(UnattendedFetchTest, DeviceManagerIsAskedAgainAfter2_4_8_16_30SecondsThenOnceAMinute) {
+    const std::pair<size_t, ULONGLONG> pauses[] = {{0, 2}, {1, 4}, {2, 8}, {3, 16}, {4, 30}, {5, 60}, {6, 60}, {100000, 60}};
+    for (const auto& pause : pauses) EXPECT_EQ(pause.second, ReconnectPauseSeconds(pause.first)) << pause.first;
 }
 
-TEST(WatchScheduleTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
+TEST(UnattendedFetchTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
     TempDirectory folder(L"calvex-fetch-log");
     const std::wstring path = folder.Path() + L"\\calvex-fetch.log";
     Append(path + L".1", "an older log");
@@ -60,4 +57,15 @@ TEST(WatchScheduleTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
     restarted.Write(L"g", At(4, 8, 12, 3));
     EXPECT_EQ(full, ReadFileBytes(path + L".1")) << "the full log replaces the older one";
     EXPECT_EQ("---- 2026-04-08 ----\r\ng\r\n", ReadFileBytes(path));
+}
+
+TEST(UnattendedFetchTest, OneLockPerFolderHoweverSpeltAndForEverySession) {
+    TempDirectory folder(L"calvex-fetch-Lock");
+    const std::wstring name = TargetLockName(folder.Path());
+    EXPECT_EQ(0u, name.find(L"Global\\calvex-fetch-")) << Narrow(name);
+    std::wstring upper = folder.Path(), slashes = folder.Path();
+    CharUpperBuffW(&upper[0], static_cast<DWORD>(upper.size()));
+    for (wchar_t& c : slashes) c = c == L'\\' ? L'/' : c;
+    for (const std::wstring& spelt : {upper, folder.Path() + L"\\", slashes + L"/"}) EXPECT_EQ(name, TargetLockName(spelt)) << Narrow(spelt);
+    EXPECT_NE(name, TargetLockName(folder.Path() + L"2"));
 }
