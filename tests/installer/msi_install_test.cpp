@@ -23,15 +23,16 @@ const wchar_t kRun[] = L"Software\\Microsoft\\Windows\\CurrentVersion\\Run";
 
 std::wstring InstallDir() { return std::wstring(_wgetenv(L"ProgramFiles")) + L"\\Calvex\\Receivers Shell Extension"; }
 
-// The installed products of this upgrade code with their versions.
+// The installed products of this upgrade code, each as the name Apps shows and its version.
 std::vector<std::wstring> InstalledVersions() {
     std::vector<std::wstring> versions;
     wchar_t product[39];
     for (DWORD i = 0; MsiEnumRelatedProductsW(kUpgradeCode, 0, i, product) == ERROR_SUCCESS; ++i) {
-        wchar_t version[64] = L"";
-        DWORD size = 64;
+        wchar_t version[64] = L"", name[128] = L"";
+        DWORD size = 64, nameSize = 128;
         MsiGetProductInfoW(product, INSTALLPROPERTY_VERSIONSTRING, version, &size);
-        versions.push_back(version);
+        MsiGetProductInfoW(product, INSTALLPROPERTY_INSTALLEDPRODUCTNAME, name, &nameSize);
+        versions.push_back(std::wstring(name) + L" " + version);
     }
     return versions;
 }
@@ -73,7 +74,7 @@ void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options = 
     wchar_t version[64] = L"";
     DWORD size = 64;
     MsiGetFileVersionW(dll.c_str(), version, &size, nullptr, nullptr);  // fails and leaves "" without the DLL
-    const std::vector<std::wstring> product = {version}, none;
+    const std::vector<std::wstring> product = {L"Calvex GNSS Receivers Shell Extension " + std::wstring(version)}, none;
     EXPECT_EQ(state == kNothing ? none : product, InstalledVersions()) << "one product, the DLL's version";
     const bool simulator = state == kExtensionAndSimulator;
     EXPECT_EQ(simulator ? L"\"" + sim + L"\"" : L"<none>", RegistryText(HKEY_CLASSES_ROOT, kDeviceMgr));
