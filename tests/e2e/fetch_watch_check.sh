@@ -38,6 +38,7 @@ tool=$!
 
 waitfor "$out" "B@USB (1000-0002!B!USB) -> " 60
 waitfor "$out" "fetched     B@USB\\LOG0001" 30
+tray && bad "an icon in the notification area for a watch in a console"
 cp -r "$away/Brennor C" "$root/"
 waitfor "$out" "Brennor C@USB (2000-0003!C!USB) plugged in -> " 30
 log "$root/Calvex A" LOG0002 7000

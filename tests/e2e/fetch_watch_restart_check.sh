@@ -20,8 +20,6 @@ mkdir -p "$root" "$target"
 source "$(dirname "$0")/lib.sh"
 fail=0
 stamp=1795000000
-# Wine's stand-alone notification area: a window of its own, shown while it holds an icon.
-tray() { xdotool search --onlyvisible --name '^Wine System Tray$' 2>/dev/null | grep -q .; }
 
 receiver "$root/Calvex A" 1 1000-0001 A
 log "$root/Calvex A" LOG0001 3000

@@ -5,6 +5,8 @@
 win() { echo "Z:$1" | sed 's|/|\\|g'; }
 
 bad() { fail=1; echo "FAIL: $*"; }
+# Wine's stand-alone notification area: a window of its own, shown while it holds an icon.
+tray() { xdotool search --onlyvisible --name '^Wine System Tray$' 2>/dev/null | grep -q .; }
 
 waitfor() {  # waitfor FILE TEXT SECONDS [TIMES]: until FILE holds TEXT (TIMES times); a failure when it does not in time
   for _ in $(seq 1 $(($3 * 10))); do

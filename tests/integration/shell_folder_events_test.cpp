@@ -73,6 +73,7 @@ TEST(ShellFolderEventsTest, TreeChangesRefreshTheBoundFolders) {
         EXPECT_EQ(1, ViewMessages()[step.view]);
         EXPECT_NE(g_notified.end(), std::find(g_notified.begin(), g_notified.end(), step.notifiedPath));
     }
+    EXPECT_TRUE(TraceContains("\tIReceiversShellFolderImpl::InitCollections\r\n"));
     EXPECT_TRUE(TraceContains("Advised for receivers, 0x"));
     EXPECT_TRUE(TraceContains("Advised for files, 0x"));
 

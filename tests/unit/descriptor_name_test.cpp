@@ -78,6 +78,7 @@ TEST(DescriptorNameTest, FolderNamesFromDisplayNamesStayOneComponent) {
 }
 
 TEST(DescriptorNameTest, WriteVirtualFileWritesOnlyBelowTheTarget) {
+    EXPECT_STREQ(L".calvex-partial", kPartialSuffix) << "the name a file has while it is written";
     struct WriteCase {
         const wchar_t* name;
         DWORD size;               // as the descriptor claims; the stream holds 5 bytes
