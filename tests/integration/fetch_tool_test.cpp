@@ -8,7 +8,6 @@
 #include <string>
 #include <vector>
 
-#include "com/Handles.h"
 #include "support/DeviceSim.h"
 #include "support/TestSupport.h"
 
@@ -210,11 +209,8 @@ TEST_F(FetchToolTest, MoveDeletesExactlyTheFilesWhoseCopiesAreProven) {
     ASSERT_EQ(0u, RunFetch(L"--receiver M1@USB " + into).exitCode);
     tree.AddFile(L"M1", L"NEW1", 5000);
     CreateDirectoryW((copies + L"MF@USB").c_str(), nullptr);
-    for (const wchar_t* stale : {L"M1@USB\\DIFFERS2.qpr", L"MF@USB\\DIFFERS.qpr"}) {  // copies that differ
-        UniqueFile file(CreateFileW((copies + stale).c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr));
-        DWORD written = 0;
-        ASSERT_TRUE(WriteFile(file.Get(), "0123456789", 10, &written, nullptr));
-    }
+    for (const wchar_t* stale : {L"M1@USB\\DIFFERS2.qpr", L"MF@USB\\DIFFERS.qpr"})  // copies that differ
+        ASSERT_TRUE(WriteFileBytes(copies + stale, "0123456789"));
     const std::vector<std::wstring> before = ListFiles(tree.Root()), copied = ListFiles(target.Path());
     std::map<std::wstring, std::string> bytes;
     for (const std::wstring& file : before) bytes[file] = ReadFileBytes(tree.Root() + L"\\" + file);

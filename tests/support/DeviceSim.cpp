@@ -37,9 +37,7 @@ void ReceiverTree::WriteDescription(const std::wstring& folder, const std::strin
 
 std::wstring ReceiverTree::AddFile(const std::wstring& folder, const std::wstring& name, const std::string& bytes) {
     const std::wstring path = FolderPath(folder) + L"\\" + name;
-    UniqueFile file(CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr));
-    DWORD written = 0;
-    if (file) WriteFile(file.Get(), bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr);
+    WriteFileBytes(path, bytes);
     return path;
 }
 
@@ -90,8 +88,7 @@ ComPtr<IReceiver> ReceiverAt(IReceiversColl* receivers, LONG index, HRESULT* res
 
 ComPtr<IReceiver> ReceiverByKey(IReceiversColl* receivers, const std::wstring& key, HRESULT* result) {
     Bstr text(key);
-    return Fetch<IReceiver>([&](IDispatch** out) { return receivers->get_ItemByKey(text.Get(), out); }, IID_IReceiver,
-                            result);
+    return Fetch<IReceiver>([&](IDispatch** out) { return receivers->get_ItemByKey(text.Get(), out); }, IID_IReceiver, result);
 }
 
 ComPtr<IFilesColl> FilesOf(IReceiver* receiver) {
@@ -105,8 +102,7 @@ ComPtr<IReceiverFile> FileAt(IFilesColl* files, LONG index, HRESULT* result) {
 
 ComPtr<IReceiverFile> FileByName(IFilesColl* files, const std::wstring& name, HRESULT* result) {
     Bstr text(name);
-    return Fetch<IReceiverFile>([&](IDispatch** out) { return files->get_ItemByName(text.Get(), out); },
-                                IID_IReceiverFile, result);
+    return Fetch<IReceiverFile>([&](IDispatch** out) { return files->get_ItemByName(text.Get(), out); }, IID_IReceiverFile, result);
 }
 
 std::wstring NameOf(IDispatch* object) {

@@ -34,6 +34,8 @@ std::vector<std::wstring> WithDialogsClosed(const wchar_t* title, const std::fun
 
 // A file's bytes, also while another holds it open for writing; empty when it cannot be read.
 std::string ReadFileBytes(const std::wstring& path);
+// Writes bytes as the file's whole content, or after what it holds; false when it cannot.
+bool WriteFileBytes(const std::wstring& path, const std::string& bytes, bool append = false);
 
 std::wstring TraceLogPath();
 std::string ReadTraceLog();  // the whole file, also while the module holds it

@@ -1,7 +1,6 @@
-// Guards what the unattended fetch promises, without waiting or a second user: the pauses before
-// the device manager is asked again, a date line in the log at each start and each new day, the
-// log turned into NAME.1 (replacing an older one) once it holds 1 MiB, and one fetch per folder
-// however the folder is spelt and whichever user runs it.
+// Guards what the unattended fetch promises, without waiting or a second user: the pauses before the device
+// manager is asked again, the log's date lines at each start and day, the log turned into NAME.1 (replacing an
+// older one) at 1 MiB, and one fetch per folder however the folder is spelt and whichever user runs it.
 #include <windows.h>
 
 #include <gtest/gtest.h>
@@ -9,19 +8,12 @@
 #include "FetchLog.h"
 #include "ReceiverWatch.h"
 #include "TargetLock.h"
-#include "com/Handles.h"
 #include "support/TestSupport.h"
 
 using namespace testsupport;
 
 namespace {
 SYSTEMTIME At(WORD month, WORD day, WORD hour, WORD minute) { return {2026, month, 0, day, hour, minute, 0, 0}; }
-
-void Append(const std::wstring& path, const std::string& bytes) {
-    UniqueFile file(CreateFileW(path.c_str(), FILE_APPEND_DATA, 0, nullptr, OPEN_ALWAYS, 0, nullptr));
-    DWORD written = 0;
-    ASSERT_TRUE(WriteFile(file.Get(), bytes.data(), static_cast<DWORD>(bytes.size()), &written, nullptr));
-}
 }  // namespace
 
 TEST(UnattendedFetchTest, DeviceManagerIsAskedAgainAfter2_4_8_16_30SecondsThenOnceAMinute) {
@@ -32,7 +24,7 @@ TEST(UnattendedFetchTest, DeviceManagerIsAskedAgainAfter2_4_8_16_30SecondsThenOn
 TEST(UnattendedFetchTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
     TempDirectory folder(L"calvex-fetch-log");
     const std::wstring path = folder.Path() + L"\\calvex-fetch.log";
-    Append(path + L".1", "an older log");
+    ASSERT_TRUE(WriteFileBytes(path + L".1", "an older log"));
     FetchLog log, restarted;
     struct Step { FetchLog* log; SYSTEMTIME now; const wchar_t* line; const char* adds; } steps[] = {
         {&log, At(3, 7, 23, 59), L"a", "---- 2026-03-07 ----\r\na\r\n"},
@@ -48,24 +40,18 @@ TEST(UnattendedFetchTest, LogDatesEachStartAndDayAndBeginsAnewAtOneMebibyte) {
         expected += step.adds;
         EXPECT_EQ(expected, ReadFileBytes(path)) << Narrow(step.line);
     }
-    // One byte short of the limit the next line still goes in; the one after begins a new file.
-    const size_t mebibyte = 1024 * 1024;
-    Append(path, std::string(mebibyte - 1 - expected.size(), 'x'));
+    // One byte short of 1 MiB the next line still goes in; the one after begins a new file.
+    ASSERT_TRUE(WriteFileBytes(path, std::string(1024 * 1024 - 1 - expected.size(), 'x'), true));
     restarted.Write(L"f", At(4, 8, 12, 2));
     const std::string full = ReadFileBytes(path);
-    EXPECT_EQ(mebibyte + 2, full.size());
     restarted.Write(L"g", At(4, 8, 12, 3));
     EXPECT_EQ(full, ReadFileBytes(path + L".1")) << "the full log replaces the older one";
     EXPECT_EQ("---- 2026-04-08 ----\r\ng\r\n", ReadFileBytes(path));
 }
 
 TEST(UnattendedFetchTest, OneLockPerFolderHoweverSpeltAndForEverySession) {
-    TempDirectory folder(L"calvex-fetch-Lock");
-    const std::wstring name = TargetLockName(folder.Path());
+    const std::wstring name = TargetLockName(L"C:\\Survey data");
     EXPECT_EQ(0u, name.find(L"Global\\calvex-fetch-")) << Narrow(name);
-    std::wstring upper = folder.Path(), slashes = folder.Path();
-    CharUpperBuffW(&upper[0], static_cast<DWORD>(upper.size()));
-    for (wchar_t& c : slashes) c = c == L'\\' ? L'/' : c;
-    for (const std::wstring& spelt : {upper, folder.Path() + L"\\", slashes + L"/"}) EXPECT_EQ(name, TargetLockName(spelt)) << Narrow(spelt);
-    EXPECT_NE(name, TargetLockName(folder.Path() + L"2"));
+    for (const wchar_t* spelt : {L"c:\\SURVEY DATA", L"C:\\Survey data\\", L"C:/Survey data/"}) EXPECT_EQ(name, TargetLockName(spelt)) << Narrow(spelt);
+    EXPECT_NE(name, TargetLockName(L"C:\\Survey data2"));
 }
