@@ -114,13 +114,20 @@ def main():
     p = argparse.ArgumentParser()
     for a in ("wxs", "dll", "sim", "fetch", "fetchw", "samples", "work", "out"):
         p.add_argument("--" + a, required=True)
+    # The same package as the next version (Windows Installer compares the first three fields),
+    # to try an upgrade over this one.
+    p.add_argument("--next", action="store_true")
     args = p.parse_args()
     version = file_version(args.dll)
+    if args.next:
+        fields = [int(f) for f in version.split(".")]
+        version = f"{fields[0]}.{fields[1]}.{fields[2] + 1}.{fields[3]}"
     stage(args.work, args.dll, args.sim, args.fetch, args.fetchw, args.samples)
     with open(os.path.join(args.work, "samples.wxs"), "w", encoding="utf-8") as f:
         f.write(sample_fragment(args.samples))
     shutil.copy(args.wxs, os.path.join(args.work, "product.wxs"))
     out = os.path.abspath(args.out)
+    os.makedirs(os.path.dirname(out), exist_ok=True)
     subprocess.run(["wixl", "-a", "x64", "-D", f"Version={version}", "-o", out, "product.wxs", "samples.wxs"],
                    cwd=args.work, check=True)
     fix_actions(out)

@@ -4,8 +4,8 @@
 # then a logon (Wine runs the Run values when wineboot starts a session): every sample file
 # lands in FETCHDIR once with nothing partial, a log says what happened, a file logged while
 # the device manager restarts comes too; installed again with FETCHMOVE and FETCHLAYOUT, the
-# next logon moves every file into its place and empties the receivers; after /x a logon
-# starts no watch.
+# next logon moves every file into its place and empties the receivers; an upgrade to the
+# next version keeps the folder, moving and the layout; after /x a logon starts no watch.
 # Guards against a logon value that does not start, quotes or points wrongly, a watch that
 # needs a console, and a removal that leaves the watch starting at each logon.
 set -u
@@ -15,7 +15,7 @@ run="$build/wine-run"
 source "$(dirname "$0")/../e2e/lib.sh"
 fail=0
 "$(dirname "$0")/../wine/prepare-prefix.sh" --fresh "$build" >/dev/null
-msi=$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null)
+msi=$(winepath -w "$build/CalvexReceiversShellExt.msi" 2>/dev/null) next=$(winepath -w "$build/next/CalvexReceiversShellExt.msi" 2>/dev/null)
 survey="$WINEPREFIX/drive_c/Survey" wlog="$WINEPREFIX/drive_c/Survey/calvex-fetch.log"
 installed="$WINEPREFIX/drive_c/Program Files/Calvex/Receivers Shell Extension"
 logon() { wineserver -k; wineserver -w; "$run" wineboot; }  # a new session, as at logon
@@ -65,8 +65,15 @@ moved=$(find "$survey/Calvex" "$survey/Brennor" -type f ! -name '*.calvex-partia
 cmp -s "$survey/Q9 GNSS@USB/LOG0099.qpr" "$survey/Calvex/Q9 GNSS@USB/LOG0099.qpr" || bad "LOG0099 filed wrongly"
 waitfor "$wlog" "Q9 GNSS@USB: 8 files in C:\Survey, 8 deleted from the receiver. Safe to unplug." 30
 
+# Upgraded to the next version without any property: the folder, moving and the layout stay.
+# (Windows carries the installed features over; Wine's msiexec does not, so they are named.)
+wineserver -k; wineserver -w
+"$run" msiexec /i "$next" /qn ADDLOCAL=ALL || bad "the upgrade ended with $?"
+value=$("$run" reg query 'HKCU\Software\Microsoft\Windows\CurrentVersion\Run' /v 'Calvex receivers watch' 2>/dev/null | tr -d '\r')
+case $value in *'calvex-fetchw.exe" --watch --move --layout "{brand}\{receiver}" "C:\Survey"'*) ;; *) bad "the logon value after the upgrade: $value" ;; esac
+
 # Removed: the logon value goes, the fetched files and the log stay, a logon starts nothing.
-"$run" msiexec /x "$msi" /qn || bad "msiexec /x ended with $?"
+"$run" msiexec /x "$next" /qn || bad "msiexec /x ended with $?"
 logon
 sleep 5
 watching && bad "a watch still starts at logon after the removal"
