@@ -113,6 +113,12 @@ tool=$!
 root=$failing downloading "Calvex G" BIG && sleep 1
 kill -9 $tool; wait $tool
 [ -e "$work/batch/G@USB/BIG.qpr" ] && bad "a download ended hard looks complete"
+# On a terminal each download shows a live bar (percent, bytes, rate), redrawn in place, then
+# the file's line: script(1) gives the tool a terminal.
+script -q -c "'$run' '$build/calvex-fetch.exe' --receiver G@USB '$(win "$work/bar")'" "$work/bar.txt" >/dev/null 2>&1
+bars=$(tr '\r' '\n' <"$work/bar.txt" | grep -cE '^  BIG\.qpr \[[#.]{20}\] [0-9]+%  [0-9]+/200000 bytes  [0-9.]+ (bytes|KB|MB)/s')
+[ "$bars" -ge 2 ] && grep -qaF $'\r  BIG.qpr [' "$work/bar.txt" && grep -qaF "  fetched     BIG.qpr  195.3 KB" "$work/bar.txt" ||
+  bad "no live bar on a terminal ($bars bars): $(tr '\r' '\n' <"$work/bar.txt" | head -5)"
 "$run" "$build/calvex-fetch.exe" --watch --brand calvex "$(win "$work/watched")" >"$out.4" 2>/dev/null &
 tool=$!
 waitfor "$out.4" "FAILED      F@USB\\BAD1.qpr" 30 2
