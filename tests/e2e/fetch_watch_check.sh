@@ -98,6 +98,8 @@ log "$failing/Calvex F" BAD1 20000
 receiver "$failing/Calvex G" 1 1000-0010 G
 log "$failing/Calvex G" BIG 200000
 log "$failing/Calvex G" SMALL 1000
+receiver "$failing/Calvex H" 1 1000-0011 H
+log "$failing/Calvex H" LOG1 1000
 "$run" reg add 'HKCU\Software\Calvex\DeviceSim' /v Root /d "$(win "$failing")" /f >/dev/null 2>&1
 "$run" "$build/calvex-fetch.exe" --receiver G@USB "$(win "$work/batch")" >"$out.4" 2>/dev/null &
 tool=$!
@@ -119,8 +121,16 @@ script -q -c "'$run' '$build/calvex-fetch.exe' --receiver G@USB '$(win "$work/ba
 bars=$(tr '\r' '\n' <"$work/bar.txt" | grep -cE '^  BIG\.qpr \[[#.]{20}\] [0-9]+%  [0-9]+/200000 bytes  [0-9.]+ (bytes|KB|MB)/s')
 [ "$bars" -ge 2 ] && grep -qaF $'\r  BIG.qpr [' "$work/bar.txt" && grep -qaF "  fetched     BIG.qpr  195.3 KB" "$work/bar.txt" ||
   bad "no live bar on a terminal ($bars bars): $(tr '\r' '\n' <"$work/bar.txt" | head -5)"
+big() { root=$failing simlog | grep -cF "$(win "$failing/Calvex G/BIG")\" started"; }
+before=$(big)
 "$run" "$build/calvex-fetch.exe" --watch --brand calvex "$(win "$work/watched")" >"$out.4" 2>/dev/null &
 tool=$!
+# H unplugged and plugged back while the watch downloads G's BIG: the watch does not see it go,
+# and talks to H as it is now when it comes to it.
+for _ in $(seq 1 300); do [ "$(big)" -gt "$before" ] && break; sleep 0.1; done
+mv "$failing/Calvex H" "$work/"; sleep 1.5; mv "$work/Calvex H" "$failing/"
+waitfor "$out.4" "fetched     H@USB\\LOG1.qpr" 30
+grep -q "FAILED      H@USB" "$out.4" && bad "H, plugged back while the watch was busy: $(grep 'H@USB' "$out.4")"
 waitfor "$out.4" "FAILED      F@USB\\BAD1.qpr" 30 2
 log "$failing/Calvex F" BAD2 20000
 waitfor "$out.4" "FAILED      F@USB\\BAD2.qpr" 30
