@@ -23,8 +23,10 @@ ends() {  # ends PID SECONDS: its exit code; killed when it runs longer
   wait $1
 }
 simlog() { cat "$prefix"/drive_c/users/*/Temp/CalvexDeviceSim.log 2>/dev/null | grep -F "$(win "$root")"; }
-downloading() {  # downloading RECEIVER FILE: until the simulator has started sending it
-  for _ in $(seq 1 300); do simlog | grep -qF "$(win "$root/$1/$2")\" started" && return 0; sleep 0.1; done
+downloading() {  # downloading RECEIVER FILE [TIMES]: until the simulator has started sending it (TIMES times)
+  for _ in $(seq 1 300); do
+    [ "$(simlog | grep -cF "$(win "$root/$1/$2")\" started")" -ge "${3:-1}" ] && return 0; sleep 0.1
+  done
   bad "the download of $1/$2 never started"; return 1
 }
 receiver() {  # receiver DIR BRAND SERIAL MODEL: 40,000 bytes a second
