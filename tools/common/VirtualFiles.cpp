@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "DescriptorName.h"
+#include "KillPoint.h"
 
 namespace {
 constexpr ULONG ChunkBytes = 1 << 20;
@@ -48,6 +49,7 @@ HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written) {
         const HRESULT hr = stream->Read(buffer.data(), ChunkBytes, &read);
         if (FAILED(hr)) return hr;
         if (read == 0) return S_OK;
+        if (written > 0) KillPoint::Pass("partway", std::wstring());
         DWORD out = 0;
         if (!WriteFile(file, buffer.data(), read, &out, nullptr) || out != read) return HRESULT_FROM_WIN32(GetLastError());
         written += read;
@@ -188,10 +190,12 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
     const std::wstring temporary = path + kPartialSuffix;
     OnDisk flushed, placed;
     HRESULT hr = WriteTemporary(temporary, descriptor, stream, error, flushed);
+    if (SUCCEEDED(hr)) KillPoint::Pass("written", temporary);
     if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
+    if (SUCCEEDED(hr)) KillPoint::Pass("renamed", path);
     if (FAILED(hr)) {
         DeleteFileW(temporary.c_str());
     } else if (!ReadOnDisk(path, placed) || placed.size != flushed.size || CompareFileTime(&placed.time, &flushed.time)) {
