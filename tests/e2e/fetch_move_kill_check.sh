@@ -15,7 +15,7 @@
 # is, the files whole in the target (and how many of those are still on their receiver), the
 # files on the receivers and any partial file.
 set -u
-build=$1
+build=$(cd "$1" && pwd)  # absolute: the Wine session is ended through WINEPREFIX
 run="$build/wine-run"
 prefix=${CALVEX_WINEPREFIX:-$build/wineprefix}
 work=$(mktemp -d /tmp/calvex-kill-XXXXXX)
