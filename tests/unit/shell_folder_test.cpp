@@ -174,6 +174,8 @@ TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
          S_OK, std::wstring(L"::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\") + kKey},
         {receiver.Get(), file.Get(), SHGDN_FORPARSING, S_OK, calvexParsing + L"\\FILE.qpr"},
         {receiver.Get(), file.Get(), SHGDN_NORMAL, S_OK, L"FILE.qpr"},
+        {root.Get(), file.Get(), SHGDN_FORPARSING, S_OK, std::wstring(kCalvexRoot) + L"\\FILE.qpr"},  // any kind, any level
+        {receiver.Get(), receiverItem.Get(), SHGDN_NORMAL, S_OK, L"Z/5@COM3"},
     };
     for (auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "flags 0x" << std::hex << c.flags);
