@@ -7,7 +7,10 @@
 const wchar_t kPartialSuffix[] = L".calvex-partial";
 
 namespace {
-constexpr size_t MaxPath = MAX_PATH - 1;  // characters, without the terminator
+// Written through extended paths (LongPath.h): the whole path may pass MAX_PATH, up to what the
+// extended form allows with its prefix; each name stays within the file systems' 255.
+constexpr size_t MaxPath = 32767 - 8;
+constexpr size_t MaxName = 255;
 
 bool IsSeparator(wchar_t c) { return c == L'\\' || c == L'/'; }
 
@@ -89,6 +92,10 @@ SafeName MakeSafeParts(std::vector<std::wstring> parts, size_t targetLength) {
         if (!MakeSafeComponent(part, result)) return result;
         joined += (joined.empty() ? L"" : L"\\") + part;
     }
+    // The last name also carries the temporary suffix while it is written.
+    if (parts.back().size() + wcslen(kPartialSuffix) > MaxName) return Refuse(L"too long for the target folder");
+    for (const std::wstring& part : parts)
+        if (part.size() > MaxName) return Refuse(L"too long for the target folder");
     if (targetLength + 1 + joined.size() + wcslen(kPartialSuffix) > MaxPath) return Refuse(L"too long for the target folder");
     result.name = joined;
     return result;

@@ -16,8 +16,9 @@ struct SafeName {
 
 // A descriptor name, which may hold sub-folders, to be written below a folder whose full path
 // has targetLength characters. Refused: empty, absolute, drive or UNC prefix, an empty, "." or
-// ".." component, a component that is nothing but dots and spaces, or a path too long for the
-// target (temporary suffix included; this also keeps every component under 255 characters). Made safe:
+// ".." component, a component that is nothing but dots and spaces, a name of more than 255
+// characters (the last one with its temporary suffix), or a path too long even for an
+// extended path below the target. Made safe:
 // control characters and characters that Windows does not allow in names become "_", trailing
 // dots and spaces are removed, a reserved device name (CON, NUL, COM1, ...) gets a "_" prefix.
 SafeName MakeSafeDescriptorName(const std::wstring& name, size_t targetLength);
