@@ -54,12 +54,18 @@ TEST(DescriptorNameTest, RefusesOrMakesSafeEveryHostileForm) {
         {L"CONSOLE.log", L"CONSOLE.log"}, {L"NULL.txt", L"NULL.txt"}, {L"xCON", L"xCON"}, {L"CLOCK$", L"CLOCK$"},
         {std::wstring(L"a\x01" L"b"), L"a_b"}, {L"tab\there\x7f", L"tab_here_"}, {L"what?<>|*\".log", L"what______.log"},
         {L"LOG:stream", L"LOG_stream"}, {L"name. . .", L"name"}, {L"sub. \\file ", L"sub\\file"}, {L"sub/file", L"sub\\file"},
-        // Lengths: past 260 in all, but no name over 255 with the temporary suffix (240 + 15).
-        {std::wstring(240, L'n'), std::wstring(240, L'n'), 200}, {std::wstring(241, L'n'), Refused, 200},
-        {L"sub\\" + std::wstring(240, L'n'), L"sub\\" + std::wstring(240, L'n'), 200},
-        {std::wstring(256, L's') + L"\\n", Refused}, {std::wstring(255, L'n'), Refused}, {L"n", Refused, 32750},
+        // Lengths: 200 + 1 + 43 + the temporary suffix = 259.
+        {std::wstring(43, L'n'), std::wstring(43, L'n'), 200}, {std::wstring(44, L'n'), Refused, 200},
+        {L"sub\\" + std::wstring(39, L'n'), L"sub\\" + std::wstring(39, L'n'), 200}, {L"sub\\" + std::wstring(40, L'n'), Refused, 200},
+        {std::wstring(255, L'n'), Refused},
     };
     for (const NameCase& row : rows) ExpectRule(row, MakeSafeDescriptorName(row.given, row.target));
+    // Through extended paths (calvex-fetch): past 260 in all, no name over 255 with the suffix.
+    const NameCase deep[] = {
+        {std::wstring(240, L'n'), std::wstring(240, L'n'), 200}, {std::wstring(241, L'n'), Refused, 200},
+        {L"s\\" + std::wstring(240, L'n'), L"s\\" + std::wstring(240, L'n'), 300}, {std::wstring(256, L's') + L"\\n", Refused},
+        {L"n", Refused, kLongPathLimit - 16}};
+    for (const NameCase& row : deep) ExpectRule(row, MakeSafeDescriptorName(row.given, row.target, kLongPathLimit));
     for (const std::wstring device : {L"COM", L"lpt"}) {
         for (wchar_t digit = L'1'; digit <= L'9'; ++digit) {
             const std::wstring name = device + digit + L".qpr";

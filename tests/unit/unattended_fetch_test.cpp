@@ -1,13 +1,12 @@
 // Guards what the unattended fetch promises, without waiting or a second user: the pauses before the device
 // manager is asked again, the log's date lines at each start and day, the log turned into NAME.1 (replacing an
 // older one) at 1 MiB, one fetch per folder however the folder is spelt and whichever user runs it, the one
-// rule by which a copy's time is the receiver's on each kind of disk, and paths past 260 characters.
+// rule by which a copy's time is the receiver's on each kind of disk.
 #include <windows.h>
 
 #include <gtest/gtest.h>
 
 #include "FetchLog.h"
-#include "LongPath.h"
 #include "ReceiverFetcher.h"
 #include "ReceiverWatch.h"
 #include "TargetLock.h"
@@ -79,43 +78,30 @@ TEST(UnattendedFetchTest, CopyInTheTimeWindowIsFetchedOnlyWithTheReceiversSize) 
         descriptor.dwFlags = FD_FILESIZE | FD_WRITESTIME;
         descriptor.nFileSizeLow = 100 + row.sizeOff;
         SystemTimeToFileTime(&logged, &descriptor.ftLastWriteTime);
-        EXPECT_EQ(row.fetched, IsAlreadyFetched(path, descriptor, row.keeping));
+        SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", row.keeping == kFat ? L"FAT32" : L"NTFS");
+        TargetDisk disk(folder.Path());
+        EXPECT_EQ(row.fetched, IsAlreadyFetched(path, descriptor, disk));
     }
+    SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", nullptr);
 }
 
 // FAT by its volume's name (or the tests' stand-in for it), or by a time the disk gave back
 // within its two seconds; a time it cannot keep at all says nothing of the kind.
 TEST(UnattendedFetchTest, DiskKeepsTwoSecondTimesByItsNameOrByWhatItGaveBack) {
-    const struct { const wchar_t* fileSystem; TimeKeeping keeping; } names[] = {
-        {L"FAT", kFat}, {L"FAT12", kFat}, {L"fat16", kFat}, {L"FAT32", kFat}, {L"exFAT", kNtfs}, {L"NTFS", kNtfs}};
-    for (const auto& name : names) {
-        SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", name.fileSystem);
-        EXPECT_EQ(name.keeping, TargetDisk(L"C:\\Survey").Keeping()) << Narrow(name.fileSystem);
-    }
-    SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", L"NTFS");
     const SYSTEMTIME odd = {2026, 6, 0, 3, 7, 58, 13, 0};
-    const struct { LONGLONG readBackOffMs; TimeKeeping keeping; } readBacks[] = {
-        {0, kNtfs}, {3000, kNtfs}, {1000, kFat}, {-1000, kFat}};
-    for (const auto& readBack : readBacks) {
+    const FILETIME none = {};  // 1601: a disk that keeps no time at all
+    const struct { const wchar_t* fileSystem; FILETIME readBack; TimeKeeping keeping; } rows[] = {
+        {L"FAT", Utc(odd), kFat},           {L"FAT12", Utc(odd), kFat},       {L"fat16", Utc(odd), kFat},
+        {L"FAT32", Utc(odd), kFat},         {L"exFAT", Utc(odd), kNtfs},      {L"NTFS", Utc(odd), kNtfs},
+        {L"NTFS", Utc(odd, 3000), kNtfs},   {L"NTFS", Utc(odd, 1000), kFat},  {L"NTFS", Utc(odd, -1000), kFat},
+        {L"NTFS", none, kNtfs}};
+    for (const auto& row : rows) {
+        SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", row.fileSystem);
         TargetDisk disk(L"C:\\Survey");
-        disk.Learn(Utc(odd), Utc(odd, readBack.readBackOffMs));
-        EXPECT_EQ(readBack.keeping, disk.Keeping()) << readBack.readBackOffMs;
+        disk.Learn(Utc(odd), row.readBack);
+        EXPECT_EQ(row.keeping, disk.Keeping()) << Narrow(row.fileSystem);
     }
-    TargetDisk wine(L"C:\\Survey");
-    wine.Learn(Utc(odd), FILETIME{});  // 1601: a disk that keeps no time
-    EXPECT_EQ(kNtfs, wine.Keeping());
     SetEnvironmentVariableW(L"CALVEX_FETCH_FILE_SYSTEM", nullptr);
-}
-
-TEST(UnattendedFetchTest, DeepPathsTakeTheExtendedFormAndUsersSeeThePlainOne) {
-    const std::wstring deep = L"C:\\" + std::wstring(150, L'p') + L"\\" + std::wstring(150, L'q');
-    const std::pair<std::wstring, std::wstring> extended[] = {
-        {L"C:\\Survey", L"\\\\?\\C:\\Survey"}, {L"\\\\server\\share\\x", L"\\\\?\\UNC\\server\\share\\x"},
-        {L"\\\\?\\C:\\x", L"\\\\?\\C:\\x"}, {L"Survey", L"Survey"}, {deep, L"\\\\?\\" + deep}};
-    for (const auto& row : extended) EXPECT_EQ(row.second, LongPath(row.first)) << Narrow(row.first);
-    EXPECT_EQ(deep, FullPlainPath(deep + L"\\"));
-    EXPECT_EQ(deep, FullPlainPath(L"\\\\?\\" + deep));
-    EXPECT_EQ(TargetLockName(deep), TargetLockName(deep + L"\\")) << "one lock however deep";
 }
 
 TEST(UnattendedFetchTest, DeviceManagerIsAskedAgainAfter2_4_8_16_30SecondsThenOnceAMinute) {
@@ -156,4 +142,7 @@ TEST(UnattendedFetchTest, OneLockPerFolderHoweverSpeltAndForEverySession) {
     EXPECT_EQ(0u, name.find(L"Global\\calvex-fetch-")) << Narrow(name);
     for (const wchar_t* spelt : {L"c:\\SURVEY DATA", L"C:\\Survey data\\", L"C:/Survey data/"}) EXPECT_EQ(name, TargetLockName(spelt)) << Narrow(spelt);
     EXPECT_NE(name, TargetLockName(L"C:\\Survey data2"));
+    const std::wstring deep = L"C:\\" + std::wstring(150, L'p') + L"\\" + std::wstring(150, L'q');
+    EXPECT_EQ(TargetLockName(deep), TargetLockName(deep + L"\\")) << "past MAX_PATH too";
+    EXPECT_NE(TargetLockName(deep), TargetLockName(deep + L"q"));
 }

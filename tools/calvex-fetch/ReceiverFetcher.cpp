@@ -42,9 +42,9 @@ std::wstring TargetLostText(const std::wstring& target, HRESULT why) {
     return L"the target cannot be reached: " + target + L" (" + HexText(why) + L")";
 }
 
-bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TimeKeeping keeping) {
+bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk) {
     const DWORD both = FD_FILESIZE | FD_WRITESTIME;
-    return (descriptor.dwFlags & both) == both && IsOnDiskAsDescribed(path, descriptor, keeping);
+    return (descriptor.dwFlags & both) == both && IsOnDiskAsDescribed(path, descriptor, disk);
 }
 
 void ReceiverFetcher::Run(IShellFolder* files, const Receiver& receiver, const std::wstring& target) {
@@ -89,11 +89,11 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item) {
     const std::wstring name = descriptor.cFileName;
     std::wstring targetDir;
     if ((m_givenUp && m_givenUp->count(name)) || !Place(descriptor, targetDir)) return;
-    const SafeName safe = MakeSafeDescriptorName(name, targetDir.size());
+    const SafeName safe = MakeSafeDescriptorName(name, targetDir.size(), kLongPathLimit);
     if (safe.refused) return Fail(name, L"refused name: " + safe.reason);
     const std::wstring shown = m_shownFolder + (safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")");
     const std::wstring path = targetDir + L"\\" + safe.name;
-    if (!m_options.all && IsAlreadyFetched(path, descriptor, m_disk->Keeping())) {
+    if (!m_options.all && IsAlreadyFetched(path, descriptor, *m_disk)) {
         ++m_totals.skipped;
         if (m_options.move) return Remove(descriptor, shown, false);
         // A watch compares again at every event: only news is worth a line there.
@@ -123,7 +123,7 @@ void ReceiverFetcher::Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor
     FILETIME kept;
     if (ReadWriteTime(path, kept)) m_disk->Learn(DescriptorWriteTime(descriptor), kept);
     // Within the rule is proof; a time off by more than the disk can explain never is.
-    if (IsAlreadyFetched(path, descriptor, m_disk->Keeping())) return Remove(descriptor, shown, true);
+    if (IsAlreadyFetched(path, descriptor, *m_disk)) return Remove(descriptor, shown, true);
     ++m_totals.kept;  // whole, but the disk cannot hold the receiver's time: no proof for a delete
     m_console.Line(L"  kept        " + line + L" (fetched; its time cannot be kept on this disk)");
 }
@@ -168,7 +168,7 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
         return false;
     }
     // S_OK: flushed, renamed with write-through, and read back in place (VirtualFiles.h).
-    return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));
+    return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error, kLongPathLimit));
 }
 
 // Only a file whose copy is proven whole gets here: fetched now (WriteVirtualFile's S_OK) or

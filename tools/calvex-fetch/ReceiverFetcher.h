@@ -89,4 +89,4 @@ private:
 // True when path holds a file of the descriptor's size and last-write time, as exactly as its
 // disk keeps times (a descriptor that does not give both never matches). --new, the watch and
 // --move's proof for a delete all ask this.
-bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TimeKeeping keeping);
+bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk);

@@ -47,10 +47,15 @@ bool SameTimeOnDisk(const FILETIME& onDisk, const FILETIME& wanted, TimeKeeping 
     return (WithinTwoSeconds(difference - kHour) || WithinTwoSeconds(difference + kHour)) && HasDaylightSavingHour(wanted);
 }
 
-TargetDisk::TargetDisk(const std::wstring& folder) : m_root(VolumeRoot(folder)) {
+TargetDisk::TargetDisk(const std::wstring& folder) : m_root(VolumeRoot(folder)) {}
+
+TimeKeeping TargetDisk::Keeping() {
+    if (m_known) return m_keeping;
+    m_known = true;
     const std::wstring name = FileSystemName(m_root);
     for (const wchar_t* fat : {L"FAT", L"FAT12", L"FAT16", L"FAT32"})
         if (CompareStringOrdinal(name.c_str(), -1, fat, -1, TRUE) == CSTR_EQUAL) m_keeping = TimeKeeping::TwoSeconds;
+    return m_keeping;
 }
 
 bool TargetDisk::FreeBytes(ULONGLONG& free) const {
@@ -61,8 +66,9 @@ bool TargetDisk::FreeBytes(ULONGLONG& free) const {
 }
 
 void TargetDisk::Learn(const FILETIME& set, const FILETIME& readBack) {
-    if (!SameTimeOnDisk(readBack, set, TimeKeeping::Seconds) && SameTimeOnDisk(readBack, set, TimeKeeping::TwoSeconds))
-        m_keeping = TimeKeeping::TwoSeconds;
+    if (SameTimeOnDisk(readBack, set, TimeKeeping::Seconds) || !SameTimeOnDisk(readBack, set, TimeKeeping::TwoSeconds)) return;
+    m_keeping = TimeKeeping::TwoSeconds;
+    m_known = true;
 }
 
 HRESULT TargetDisk::Reach(const std::wstring& folder) {

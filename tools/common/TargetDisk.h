@@ -24,7 +24,9 @@ public:
 
     // The volume's root as the user knows it: "D:\", "\\server\share\".
     const std::wstring& Root() const { return m_root; }
-    TimeKeeping Keeping() const { return m_keeping; }
+    // Asked of the volume on the first call only: callers ask when a copy is a second or more
+    // off (Wine warns on the console when asked for the volume of its root drive).
+    TimeKeeping Keeping();
     // Bytes this user may still write there; false when the disk does not say.
     bool FreeBytes(ULONGLONG& free) const;
     // A time set on a file and read back another way, within what FAT makes of it: the disk
@@ -37,4 +39,5 @@ public:
 private:
     std::wstring m_root;
     TimeKeeping m_keeping = TimeKeeping::Seconds;
+    bool m_known = false;
 };

@@ -154,12 +154,13 @@ ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
     return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
 }
 
-bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TimeKeeping keeping) {
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk) {
     OnDisk found;
     if (!ReadOnDisk(path, found)) return false;
     const FILETIME time = DescriptorWriteTime(descriptor);
     if ((descriptor.dwFlags & FD_FILESIZE) && found.size != DescriptorSize(descriptor)) return false;
-    return !(descriptor.dwFlags & FD_WRITESTIME) || SameTimeOnDisk(found.time, time, keeping);
+    return !(descriptor.dwFlags & FD_WRITESTIME) || SameTimeOnDisk(found.time, time, TimeKeeping::Seconds) ||
+           SameTimeOnDisk(found.time, time, disk.Keeping());
 }
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
@@ -199,8 +200,8 @@ HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream) {
     return S_OK;
 }
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
-                         std::wstring& error) {
-    const SafeName safe = MakeSafeDescriptorName(descriptor.cFileName, targetDir.size());
+                         std::wstring& error, size_t pathLimit) {
+    const SafeName safe = MakeSafeDescriptorName(descriptor.cFileName, targetDir.size(), pathLimit);
     if (safe.refused) {
         error = L"refused name: " + safe.reason;
         return E_ACCESSDENIED;

@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "DescriptorName.h"
 #include "TargetDisk.h"
 
 // The data object's "FileGroupDescriptorW", one record per file.
@@ -26,7 +27,7 @@ FILETIME DescriptorWriteTime(const FILEDESCRIPTORW& descriptor);
 ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor);
 // True when path is a file of the size and last-write time that the descriptor gives, the time
 // as exactly as its disk keeps times (SameTimeOnDisk); what it does not give is not compared.
-bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TimeKeeping keeping);
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk);
 
 // Writes the stream's remaining bytes as target\name, the name made safe or refused by
 // MakeSafeDescriptorName (DescriptorName.h): to a temporary name first, then the size is
@@ -36,7 +37,7 @@ bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descri
 // that the disk cannot hold is not the descriptor's). Nothing is left behind on failure;
 // error says why ("the disk is full (0x80070070)" when the disk refused the rest).
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
-                         std::wstring& error);
+                         std::wstring& error, size_t pathLimit = kShortPathLimit);
 
 // One line of progress or failure for the user.
 using PasteReport = std::function<void(const std::wstring& line)>;
