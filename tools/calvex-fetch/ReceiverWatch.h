@@ -62,6 +62,7 @@ private:
     bool DeviceManagerGone();
     void WaitForWork(DWORD milliseconds);
     void TellIdle();
+    bool TargetReached(HRESULT why);
     void EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged);
     std::wstring Summary() const;
 
@@ -78,6 +79,7 @@ private:
     bool m_brandDirty[2] = {};
     bool m_plugging = false;  // after the first scan, a new receiver has been plugged in
     bool m_gone = false;
+    bool m_targetLost = false;  // said so; said again once it is back
     std::map<std::wstring, Watched> m_watched;  // by brand and key
     FetchTotals m_totals;
     WatchObserver* m_observer = nullptr;
