@@ -15,6 +15,7 @@ public:
         StopRunningServers();
         const std::wstring exe = RegisteredExe();
         if (exe.empty()) return;
+        const size_t logBefore = ReadLog().size();  // a server of an earlier run may have had the same id
         std::wstring command = L"\"" + exe + L"\" /Root \"" + root + L"\"";
         STARTUPINFOW startup = {sizeof startup};
         PROCESS_INFORMATION info = {};
@@ -22,7 +23,7 @@ public:
             return;
         CloseHandle(info.hThread);
         m_process.Reset(info.hProcess);
-        m_ready = WaitForLogLine("[" + std::to_string(info.dwProcessId) + "] server started", 20000);
+        m_ready = WaitForLogLine("[" + std::to_string(info.dwProcessId) + "] server started", logBefore, 20000);
     }
     ~SimServerProcess() {
         if (!m_process) return;
@@ -69,19 +70,24 @@ private:
         SignalQuit(false);
     }
 
-    // The server writes this line once its class object is registered.
-    static bool WaitForLogLine(const std::string& line, DWORD milliseconds) {
+    static std::string ReadLog() {
         wchar_t dir[MAX_PATH] = L"";
         GetTempPathW(MAX_PATH, dir);
         const std::wstring path = std::wstring(dir) + L"CalvexDeviceSim.log";
+        UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr,
+                                    OPEN_EXISTING, 0, nullptr));
+        if (!file) return std::string();
+        std::string text(GetFileSize(file.Get(), nullptr), '\0');
+        DWORD read = 0;
+        if (!text.empty()) ReadFile(file.Get(), &text[0], static_cast<DWORD>(text.size()), &read, nullptr);
+        return text;
+    }
+
+    // The server writes this line once its class object is registered; looked for past from.
+    static bool WaitForLogLine(const std::string& line, size_t from, DWORD milliseconds) {
         for (DWORD waited = 0; waited < milliseconds; waited += 50, Sleep(50)) {
-            UniqueFile file(CreateFileW(path.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr,
-                                        OPEN_EXISTING, 0, nullptr));
-            if (!file) continue;
-            std::string text(GetFileSize(file.Get(), nullptr), '\0');
-            DWORD read = 0;
-            if (!text.empty()) ReadFile(file.Get(), &text[0], static_cast<DWORD>(text.size()), &read, nullptr);
-            if (text.find(line) != std::string::npos) return true;
+            const std::string text = ReadLog();
+            if (text.size() > from && text.find(line, from) != std::string::npos) return true;
         }
         return false;
     }

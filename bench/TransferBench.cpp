@@ -12,48 +12,12 @@
 #include <string>
 #include <vector>
 
-#include "CalvexDeviceMgrLib.h"
+#include "ContractDownload.h"
 #include "SimServerProcess.h"
-#include "com/Bstr.h"
-#include "com/ComPtr.h"
-#include "com/DispEventSink.h"
 #include "module/ClassCreators.h"
 #include "module/ModuleApp.h"
 
 namespace {
-const wchar_t kSerial[] = L"9000-0001";
-
-// Ends the raw download's wait on the finish event.
-class FinishSink : public DispEventSinkImpl<FinishSink> {
-public:
-    FinishSink() : DispEventSinkImpl<FinishSink>(DIID__IReceiverFileEvents, LIBID_CalvexDeviceMgrLib, 1, 0) {}
-    static const SinkEntry* SinkMap() {
-        static const SinkEntry map[] = {{3, &FinishSink::OnFinish}, {0, nullptr}};
-        return map;
-    }
-    bool finished = false;
-    LONG result = E_PENDING;
-
-private:
-    void OnFinish(const VARIANT* args, UINT count) {
-        finished = true;
-        if (count >= 2) result = args[1].lVal;
-    }
-};
-
-void Pump() {
-    MSG message;
-    MsgWaitForMultipleObjects(0, nullptr, FALSE, 20, QS_ALLINPUT);
-    while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) DispatchMessageW(&message);
-}
-
-double Seconds(LARGE_INTEGER from) {
-    LARGE_INTEGER now, frequency;
-    QueryPerformanceCounter(&now);
-    QueryPerformanceFrequency(&frequency);
-    return double(now.QuadPart - from.QuadPart) / double(frequency.QuadPart);
-}
-
 double PeakMiB() {
     PROCESS_MEMORY_COUNTERS counters = {sizeof(counters)};
     GetProcessMemoryInfo(GetCurrentProcess(), &counters, sizeof(counters));
@@ -93,36 +57,13 @@ std::wstring MakeTree(size_t bytes) {
 
 // The floor: the contract's calls, a memory stream, the finish event; no dialog, no folder.
 ULONGLONG RawDownload() {
-    ComPtr<IDeviceMgr> manager;
-    CoCreateInstance(CLSID_DeviceMgr, nullptr, CLSCTX_LOCAL_SERVER, IID_IDeviceMgr, manager.PutVoid());
-    ComPtr<IDispatch> receiversDispatch, receiverDispatch, filesDispatch, fileDispatch;
-    if (!manager || FAILED(manager->get_Receivers(&receiversDispatch))) return 0;
-    ComPtr<IReceiversColl> receivers;
-    receiversDispatch.QueryTo(IID_IReceiversColl, receivers.PutVoid());
-    Bstr key(std::wstring(L"USB-") + kSerial);
-    ComPtr<IReceiver> receiver;
-    if (!receivers || FAILED(receivers->get_ItemByKey(key.Get(), &receiverDispatch))) return 0;
-    receiverDispatch.QueryTo(IID_IReceiver, receiver.PutVoid());
     ComPtr<IFilesColl> files;
-    if (!receiver || FAILED(receiver->get_Files(&filesDispatch))) return 0;
-    filesDispatch.QueryTo(IID_IFilesColl, files.PutVoid());
+    ComPtr<IDispatch> file;
     Bstr name(L"BIG");
-    if (!files || FAILED(files->get_ItemByName(name.Get(), &fileDispatch))) return 0;
-    ComPtr<IReceiverFile> file;
-    fileDispatch.QueryTo(IID_IReceiverFile, file.PutVoid());
-    ComPtr<FinishSink> sink(new FinishSink());
-    sink->Advise(fileDispatch.Get());
+    if (FAILED(OpenReceiverFiles(L"USB-9000-0001", files)) || FAILED(files->get_ItemByName(name.Get(), &file))) return 0;
     ComPtr<IStream> stream;
     CreateStreamOnHGlobal(nullptr, TRUE, stream.ReleaseAndGetAddressOf());
-    VARIANT destination;
-    VariantInit(&destination);
-    destination.vt = VT_UNKNOWN;
-    stream.CopyTo(&destination.punkVal);
-    const HRESULT hr = file->Download(destination);
-    VariantClear(&destination);
-    while (SUCCEEDED(hr) && !sink->finished) Pump();
-    sink->Unadvise(fileDispatch.Get());
-    return sink->result == S_OK ? StreamSize(stream.Get()) : 0;
+    return DownloadThroughContract(file.Get(), stream.Get()) == S_OK ? StreamSize(stream.Get()) : 0;
 }
 
 // The product: the receiver folder's data object asked for the file's contents.
@@ -175,7 +116,7 @@ int main(int argc, char** argv) {
         LARGE_INTEGER start;
         QueryPerformanceCounter(&start);
         const ULONGLONG got = runs[i].download();
-        seconds[i] = Seconds(start);
+        seconds[i] = SecondsSince(start);
         std::printf("%-24s %8.2f s  %7.2f MiB/s  %s  peak working set %.1f MiB (file %zu MiB)\n", runs[i].name,
                     seconds[i], mib / seconds[i], got == bytes ? "complete" : "INCOMPLETE", PeakMiB(), mib);
         std::fflush(stdout);

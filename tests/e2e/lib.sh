@@ -29,10 +29,10 @@ downloading() {  # downloading RECEIVER FILE [TIMES]: until the simulator has st
   done
   bad "the download of $1/$2 never started"; return 1
 }
-receiver() {  # receiver DIR BRAND SERIAL MODEL: 40,000 bytes a second
+receiver() {  # receiver DIR BRAND SERIAL MODEL [RATE]: 40,000 bytes a second unless given (0: full speed)
   mkdir -p "$1"
-  printf '[Receiver]\r\nBrand=%s\r\nLabel=Test\r\nSerialNumber=%s\r\nModel=%s\r\nPortType=2\r\n[Transfer]\r\nRate=40000\r\n' \
-    "$2" "$3" "$4" >"$1/receiver.ini"
+  printf '[Receiver]\r\nBrand=%s\r\nLabel=Test\r\nSerialNumber=%s\r\nModel=%s\r\nPortType=2\r\n[Transfer]\r\nRate=%s\r\n' \
+    "$2" "$3" "$4" "${5:-40000}" >"$1/receiver.ini"
 }
 log() {  # log DIR NAME BYTES: a file the receiver logs, with a time of its own, there at once
   stamp=$((stamp + 61))

@@ -1,5 +1,6 @@
 #include "ReceiverFileDeleter.h"
 
+#include "KillPoint.h"
 #include "ReceiverList.h"
 #include "VirtualFiles.h"
 #include "com/Bstr.h"
@@ -84,6 +85,8 @@ ReceiverFileDeleter::Outcome ReceiverFileDeleter::Delete(const FILEDESCRIPTORW& 
     if (SUCCEEDED(why)) why = file->get_Time(&time);
     if (FAILED(why)) return Outcome::Refused;
     if (!ReportMatchesDescriptor(size, time, descriptor)) return Outcome::Changed;
+    KillPoint::Pass("deleting", descriptor.cFileName);
     why = file->Delete();
+    if (why == S_OK) KillPoint::Pass("deleted", descriptor.cFileName);
     return why == S_OK ? Outcome::Deleted : Outcome::Refused;
 }

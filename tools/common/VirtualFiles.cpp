@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "DescriptorName.h"
+#include "KillPoint.h"
 #include "LongPath.h"
 
 namespace {
@@ -76,6 +77,7 @@ HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written, std::wstrin
             return hr;
         }
         if (read == 0) return S_OK;
+        if (written > 0) KillPoint::Pass("partway", std::wstring());
         if (!WriteWhole(file, buffer.data(), read)) {
             const DWORD code = GetLastError();
             error = WriteErrorText(L"cannot write the file", code);
@@ -218,11 +220,13 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
     const std::wstring temporary = path + kPartialSuffix;
     OnDisk flushed, placed;
     HRESULT hr = WriteTemporary(temporary, descriptor, stream, error, flushed);
+    if (SUCCEEDED(hr)) KillPoint::Pass("written", temporary);
     if (SUCCEEDED(hr) &&
         !MoveFileExW(LongPath(temporary).c_str(), LongPath(path).c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
+    if (SUCCEEDED(hr)) KillPoint::Pass("renamed", path);
     if (FAILED(hr)) {
         DeleteFileW(LongPath(temporary).c_str());
     } else if (!ReadOnDisk(path, placed) || placed.size != flushed.size || CompareFileTime(&placed.time, &flushed.time)) {
