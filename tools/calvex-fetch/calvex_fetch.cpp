@@ -33,6 +33,9 @@
 #include "TrayIcon.h"
 #include "TrayNotifier.h"
 #include "WatchNotice.h"
+#ifdef CALVEX_WINDOWLESS
+#include "FetchStart.h"
+#endif
 
 namespace {
 const wchar_t kNoReceiver[] = L"no receiver is connected";
@@ -40,6 +43,7 @@ const wchar_t kNoReceiver[] = L"no receiver is connected";
 std::atomic<bool> g_interrupted{false};
 HANDLE g_stop = nullptr;      // set when the user stops the tool
 HANDLE g_finished = nullptr;  // set once the summary is out
+std::vector<std::wstring> g_settingsLines;  // damaged stored settings, for the log once it is open
 
 // Ctrl+C cancels the running download through its dialog, as the user would; no file that
 // looks complete is left, and the summary is still printed. Closing the console, logging off
@@ -157,6 +161,7 @@ int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchConsole
     const std::wstring target = FullPath(options.target);
 #ifdef CALVEX_WINDOWLESS
     console.SetLog(options.log.empty() ? target + L"\\calvex-fetch.log" : FullPath(options.log));
+    for (const std::wstring& line : g_settingsLines) console.Line(line);
 #else
     if (!options.log.empty()) console.SetLog(FullPath(options.log));
 #endif
@@ -204,13 +209,35 @@ int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchConsole
     console.Line(Summary(options, totals, GetTickCount64() - started));
     return totals.failed || g_interrupted ? 1 : 0;
 }
+
+// The logon start and the Start menu's watch with the stored settings (the logon start not at
+// all when they say so), the settings window alone, or the command line as it stands.
+bool ParseArguments(std::vector<std::wstring> arguments, FetchOptions& options, std::wstring& error, int& done) {
+#ifdef CALVEX_WINDOWLESS
+    const FetchStart start = TakeFetchStart(arguments);
+    if (start == FetchStart::Settings) {
+        if (FAILED(OleInitialize(nullptr))) return done = 2, false;
+        done = RunSettingsAlone();
+        OleUninitialize();
+        return false;
+    }
+    if (start != FetchStart::CommandLine) {
+        const FetchSettings stored = LoadFetchSettings([](const std::wstring& line) { g_settingsLines.push_back(line); });
+        if (start == FetchStart::Logon && !stored.startAtLogon) return done = 0, false;
+        return OptionsOverSettings(stored, arguments, options, error);
+    }
+#endif
+    return ParseFetchOptions(arguments, options, error);
+}
 }  // namespace
 
 int wmain(int argc, wchar_t** argv) {
     FetchConsole console;
     FetchOptions options;
     std::wstring error;
-    if (!ParseFetchOptions(std::vector<std::wstring>(argv + 1, argv + argc), options, error)) {
+    int done = -1;
+    if (!ParseArguments(std::vector<std::wstring>(argv + 1, argv + argc), options, error, done)) {
+        if (done >= 0) return done;
         LogWhereTheUserLooks(console);
         console.Error(error);
         console.Line(kFetchUsage);
