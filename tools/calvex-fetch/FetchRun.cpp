@@ -89,6 +89,7 @@ int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchFront& 
     const std::wstring target = FullPath(options.target);
     const std::wstring log = options.log.empty() ? front.DefaultLog(target) : FullPath(options.log);
     if (!log.empty()) console.SetLog(log);
+    front.LogOpened(console);
     if (!options.dryRun && !IsWritableFolder(target)) {
         if (options.log.empty()) front.LogWhereTheUserLooks(console);
         console.Error(L"target not writable: " + target);
@@ -164,7 +165,7 @@ bool IsWritableFolder(const std::wstring& target) {
 int RunFetch(const std::vector<std::wstring>& arguments, FetchFront& front, FetchConsole& console) {
     FetchOptions options;
     std::wstring error;
-    if (!ParseFetchOptions(arguments, options, error)) {
+    if (!front.Parse(arguments, options, error)) {
         front.LogWhereTheUserLooks(console);
         console.Error(error);
         console.Line(kFetchUsage);

@@ -6,6 +6,7 @@
 #include "FetchSettings.h"
 #include "SettingsDialog.h"
 #include "TrayMenu.h"
+#include "WatchNotice.h"
 
 namespace {
 constexpr ULONGLONG kHourMs = 60 * 60 * 1000;
@@ -44,8 +45,8 @@ void OpenFolderWindow(const std::wstring& folder) {
     ShellExecuteW(nullptr, L"open", L"explorer.exe", (L"\"" + path + L"\"").c_str(), nullptr, SW_SHOWNORMAL);
 }
 
-WatchFace::WatchFace(TrayNotifier& notifier, WatchControl& control, const FetchOptions& options, bool openSettings)
-    : m_notifier(notifier), m_control(control), m_options(options), m_openSettings(openSettings),
+WatchFace::WatchFace(TrayNotifier& notifier, WatchControl& control, const FetchOptions& options)
+    : m_notifier(notifier), m_control(control), m_options(options),
       m_ready(CreateEventW(nullptr, TRUE, FALSE, nullptr)) {
     m_thread.Reset(CreateThread(nullptr, 0, Run, this, 0, &m_threadId));
     if (m_thread) WaitForSingleObject(m_ready.Get(), 5000);
@@ -66,7 +67,6 @@ DWORD WINAPI WatchFace::Run(void* self) {
         face->m_icon = &icon;
         face->m_notifier.SetIcon(&icon);
         SetEvent(face->m_ready.Get());
-        if (face->m_openSettings) PostMessageW(icon.Window(), TrayIcon::ShowSettingsMessage(), 0, 0);
         MSG message;
         while (GetMessageW(&message, nullptr, 0, 0) > 0) {
             TranslateMessage(&message);

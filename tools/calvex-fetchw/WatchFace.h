@@ -13,9 +13,8 @@
 
 class WatchFace : public TrayIcon::Listener {
 public:
-    // options: the watch's as it starts; openSettings: the settings window at once (a start
-    // from the Start menu's entry).
-    WatchFace(TrayNotifier& notifier, WatchControl& control, const FetchOptions& options, bool openSettings);
+    // options: the watch's as it starts.
+    WatchFace(TrayNotifier& notifier, WatchControl& control, const FetchOptions& options);
     ~WatchFace();
     WatchFace(const WatchFace&) = delete;
     WatchFace& operator=(const WatchFace&) = delete;
@@ -33,7 +32,6 @@ private:
     TrayNotifier& m_notifier;
     WatchControl& m_control;
     FetchOptions m_options;  // as last applied: what the settings window starts from
-    bool m_openSettings;
     bool m_inSettings = false;
     TrayIcon* m_icon = nullptr;
     DWORD m_threadId = 0;

@@ -3,6 +3,7 @@
 #include <windows.h>
 
 #include "FetchRun.h"
+#include "FetchStart.h"
 #include "OffScreenDialogs.h"
 #include "ReceiverWatch.h"
 #include "SessionEndWindow.h"
@@ -10,6 +11,22 @@
 #include "WatchControl.h"
 #include "WatchFace.h"
 #include "WatchInstance.h"
+
+void WindowlessFront::UseStored(const FetchSettings& stored, const std::vector<std::wstring>& lines) {
+    m_stored = true;
+    m_settings = stored;
+    m_lines = lines;
+}
+
+bool WindowlessFront::Parse(const std::vector<std::wstring>& arguments, FetchOptions& options, std::wstring& error) {
+    if (m_stored) return OptionsOverSettings(m_settings, arguments, options, error);
+    return ParseFetchOptions(arguments, options, error);
+}
+
+void WindowlessFront::LogOpened(FetchConsole& console) {
+    for (const std::wstring& line : m_lines) console.Line(line);
+    m_lines.clear();
+}
 
 std::wstring WindowlessFront::DefaultLog(const std::wstring& target) const { return target + L"\\calvex-fetch.log"; }
 
@@ -33,6 +50,6 @@ int WindowlessFront::Watch(ReceiverWatch& watch, TargetLock& lock) {
     WatchControl control;
     watch.SetObserver(&notifier);
     watch.SetControl(&control, &lock);
-    WatchFace face(notifier, control, watch.Options(), m_openSettings);
+    WatchFace face(notifier, control, watch.Options());
     return watch.Run();
 }

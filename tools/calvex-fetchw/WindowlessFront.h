@@ -5,11 +5,16 @@
 // notification area (unless --no-notify).
 #include "FetchFront.h"
 #include "FetchOptions.h"
+#include "FetchSettings.h"
 
 class WindowlessFront : public FetchFront {
 public:
-    // openSettings: the watch shows its settings window as soon as it starts.
-    explicit WindowlessFront(bool openSettings = false) : m_openSettings(openSettings) {}
+    // A watch of the stored settings, the arguments' options winning over them; lines: what
+    // was damaged in them, for the log.
+    void UseStored(const FetchSettings& stored, const std::vector<std::wstring>& lines);
+
+    bool Parse(const std::vector<std::wstring>& arguments, FetchOptions& options, std::wstring& error) override;
+    void LogOpened(FetchConsole& console) override;
 
     std::wstring DefaultLog(const std::wstring& target) const override;
     void LogWhereTheUserLooks(FetchConsole& console) const override;
@@ -17,5 +22,7 @@ public:
     int Watch(ReceiverWatch& watch, TargetLock& lock) override;
 
 private:
-    bool m_openSettings;
+    bool m_stored = false;
+    FetchSettings m_settings;
+    std::vector<std::wstring> m_lines;
 };
