@@ -2,8 +2,7 @@
 // tray_menu_check.sh: the icon's own callback messages (NOTIFYICON_VERSION_4, as the taskbar sends them), then
 // keys to the menu that opens. Exit code 0 when done, 1 when the watch or its menu cannot be found.
 //   tray_driver click | enter | notice      a click on the icon, Enter on it, a click on the balloon
-//   tray_driver menu [KEYS]                 a right-click; prints the menu's lines once it shows, then types
-//                                           KEYS into it (a letter picks by its mnemonic, ">" is Enter,
+//   tray_driver menu [KEYS]                 a right-click; once the menu shows, types KEYS into it (a letter picks by its mnemonic, ">" is Enter,
 //                                           "v" Down)
 //   tray_driver keys KEYS                   the same KEYS into the menu that is open ("\e" closes it)
 //   tray_driver close TITLE                 closes the window of that title (an Explorer window it opened)
@@ -37,18 +36,6 @@ HWND OpenMenu(HWND watch) {
     GetWindowThreadProcessId(watch, &search.process);
     for (int i = 0; i < 100 && !search.found; ++i, Sleep(100)) EnumWindows(FindMenu, reinterpret_cast<LPARAM>(&search));
     return search.found;
-}
-
-void PrintMenu(HWND menuWindow) {
-    const HMENU menu = reinterpret_cast<HMENU>(SendMessageW(menuWindow, 0x01E1 /* MN_GETHMENU */, 0, 0));
-    for (int i = 0; menu && i < GetMenuItemCount(menu); ++i) {
-        wchar_t text[512] = L"";
-        GetMenuStringW(menu, i, text, 512, MF_BYPOSITION);
-        const UINT state = GetMenuState(menu, i, MF_BYPOSITION);
-        if (state & MF_SEPARATOR) continue;
-        std::printf("%s%ls\n", state & MF_GRAYED ? "(greyed) " : "", text);
-    }
-    std::fflush(stdout);
 }
 
 void Type(HWND menuWindow, const std::string& keys) {
@@ -85,7 +72,6 @@ int main(int argc, char** argv) {
     if (what == "menu") PostMessageW(watch, kCallback, at, MAKELPARAM(WM_CONTEXTMENU, kIconId));
     const HWND menu = OpenMenu(watch);
     if (!menu) return std::fprintf(stderr, "tray_driver: no menu came\n"), 1;
-    if (what == "menu") PrintMenu(menu);
     if (argc > 2) Type(menu, argv[2]);
     return 0;
 }

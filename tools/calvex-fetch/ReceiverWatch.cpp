@@ -156,7 +156,8 @@ void ReceiverWatch::TellPaused() {
     const ULONGLONG left = m_control->PauseLeft();
     const ULONGLONG until = left ? GetTickCount64() + left : 1;
     if (!IsOtherPause(m_pausedUntil, until)) return;  // told already
-    if (!m_pausedUntil) m_console.Line(left ? L"paused for " + Duration(left) : L"paused until resumed");
+    if (!m_pausedUntil)
+        m_console.Line(left ? L"paused for " + std::to_wstring((left + 30000) / 60000) + L" min" : L"paused until resumed");
     m_pausedUntil = until;
     m_idle = false;
     if (m_observer) m_observer->Paused(left);
