@@ -4,7 +4,7 @@
 
 #include <vector>
 
-#include "Handles.h"
+#include "com/Handles.h"
 #include "LayoutPattern.h"
 #include "SettingsChoice.h"
 

@@ -2,7 +2,7 @@
 
 #include <cwctype>
 
-#include "Handles.h"
+#include "com/Handles.h"
 
 const SettingsChoice::Layout SettingsChoice::kLayouts[] = {
     {L"by receiver", L"{receiver}"},

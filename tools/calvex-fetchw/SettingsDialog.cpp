@@ -5,7 +5,7 @@
 
 #include <atomic>
 
-#include "ComPtr.h"
+#include "com/ComPtr.h"
 #include "SettingsChoice.h"
 #include "SettingsResources.h"
 
