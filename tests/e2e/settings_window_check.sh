@@ -12,9 +12,12 @@ set -u
 build=$1
 run="$build/wine-run"
 source "$(dirname "$0")/lib.sh"
+cwin() { echo "C:${1#$prefix/drive_c}" | sed 's|/|\\|g'; }
 fail=0
 work=$(mktemp -d /tmp/calvex-settings-XXXXXX)
-root=$work/root first=$work/first made=$work/new/Survey wlog=$work/watch.log shots=$build/shots
+prefix=${CALVEX_WINEPREFIX:-$build/wineprefix}
+# The folder to be made on drive C:, as a surveyor's would be (and so in the README's picture).
+root=$work/root first=$work/first made="$prefix/drive_c/Surveys/Campaign 7" wlog=$work/watch.log shots=$build/shots
 key='HKCU\Software\Calvex\Receivers Shell Extension'
 mkdir -p "$root" "$first" "$shots"
 receiver "$root/Calvex R8" 1 1000-0008 R8
@@ -54,8 +57,9 @@ open
 shows "target=$(win "$first")" "problem=" "layout=by receiver" "pattern={receiver}" "ok=1" "move=0" "notify=1" "logon=1" \
   "example=A file that R8@USB logs on $today goes to $(win "$first")\\R8@USB"
 # A folder that is not there yet: refused in place, offered to be made; Enter does nothing.
-keys ctrl+a; typed "$(win "$made")"
+keys ctrl+a; typed "$(cwin "$made")"
 shows "problem=This folder does not exist yet." "make=1" "ok=0"
+import -window "$window" "$shots/settings-missing-folder.png" 2>/dev/null
 keys Return; sleep 1
 kill -0 $tool 2>/dev/null || bad "Enter closed the window with a folder that does not exist"
 keys alt+m
@@ -64,10 +68,21 @@ shows "problem=" "make=0" "ok=1"
 # A pattern of one's own with an error: the same words as --layout's, and OK held back.
 keys alt+w End alt+p ctrl+a; typed '{receiver}\{doy2}'
 shows "layout=a pattern of my own" "example=This pattern cannot be used: unknown field {doy2}" "ok=0"
+import -window "$window" "$shots/settings-pattern-error.png" 2>/dev/null
 # A common layout instead: its pattern shown, and where R8's file of today would land.
 keys alt+w Home Down Down
 shows "layout=by year and day, then receiver" "pattern={yyyy}\\{doy}\\{receiver}" "ok=1" \
-  "example=A file that R8@USB logs on $today goes to $(win "$made")\\$year\\$doy\\R8@USB"
+  "example=A file that R8@USB logs on $today goes to $(cwin "$made")\\$year\\$doy\\R8@USB"
+# Browse... opens the shell's folder picker on the folder; closing it changes nothing.
+keys alt+r
+for _ in $(seq 1 100); do
+  picker=$(xdotool search --onlyvisible --name "^Folder for the receivers' files$" 2>/dev/null | head -1)
+  [ -n "$picker" ] && break; sleep 0.1
+done
+[ -n "$picker" ] || bad "Browse... opened no folder picker"
+sleep 1; import -window root "$shots/settings-browse.png" 2>/dev/null
+keys Escape
+shows "target=$(cwin "$made")" "ok=1"
 keys alt+e alt+n alt+s
 shows "move=1" "notify=0" "logon=0"
 sleep 0.5
@@ -75,14 +90,14 @@ import -window "$window" "$shots/settings-window.png" 2>/dev/null || bad "no scr
 keys Return
 ends $tool 10 >/dev/null; status=$?
 [ $status = 0 ] || bad "OK ended the window with $status"
-[ "$(stored FetchDir)" = "$(win "$made")" ] || bad "FetchDir stored: $(stored FetchDir)"
+[ "$(stored FetchDir)" = "$(cwin "$made")" ] || bad "FetchDir stored: $(stored FetchDir)"
 [ "$(stored FetchLayout)" = '{yyyy}\{doy}\{receiver}' ] || bad "FetchLayout stored: $(stored FetchLayout)"
 [ "$(stored FetchMove)$(stored FetchNotify)$(stored FetchStartAtLogon)" = 100 ] ||
   bad "switches stored: $(stored FetchMove)$(stored FetchNotify)$(stored FetchStartAtLogon)"
 
 # The next start shows the choice again; Cancel keeps it as it was.
 open
-shows "target=$(win "$made")" "layout=by year and day, then receiver" "pattern={yyyy}\\{doy}\\{receiver}" "move=1" \
+shows "target=$(cwin "$made")" "layout=by year and day, then receiver" "pattern={yyyy}\\{doy}\\{receiver}" "move=1" \
   "notify=0" "logon=0" "ok=1"
 keys alt+e Escape
 ends $tool 10 >/dev/null; status=$?
@@ -99,12 +114,12 @@ ends $! 15; status=$?
 "$run" "$build/calvex-fetchw.exe" --logon --log "$(win "$wlog")" >/dev/null 2>&1 &
 tool=$!
 waitfor "$wlog" "settings: FetchNotify is damaged (\"maybe\" is neither 1 nor 0), on is used" 30
-waitfor "$wlog" "new files into $(win "$made")" 30
+waitfor "$wlog" "new files into $(cwin "$made")" 30
 "$run" taskkill /f /im calvex-fetchw.exe >/dev/null 2>&1
 ends $tool 15 >/dev/null
 
 "$run" reg delete "$key" /f >/dev/null 2>&1
 "$run" "$build/CalvexDeviceSim.exe" /Quit
-rm -rf "$work"
+rm -rf "$work" "$prefix/drive_c/Surveys"
 [ $fail -eq 0 ] && echo "PASS: the settings window refused a missing folder and a bad pattern in place, stored the choice, showed it again; the logon start followed it"
 exit $fail
