@@ -72,7 +72,9 @@ sleep 8
 [ "$(fetched 'A@USB\LOG0002')" = 0 ] || bad "LOG0002 was fetched while paused"
 # The icon says so: it is not the one of a running watch.
 import -window "$trayid" "$shots/tray-paused.png" 2>/dev/null
-[ "$(compare -metric AE "$shots/tray-running.png" "$shots/tray-paused.png" null: 2>&1)" != 0 ] || bad "the icon does not show the pause"
+icons() { convert "$1" -gravity south -crop 0x24+0+0 +repage "$2"; }  # below the tray's title
+icons "$shots/tray-running.png" "$work/running-icons.png"; icons "$shots/tray-paused.png" "$work/paused-icons.png"
+[ "$(compare -metric AE "$work/running-icons.png" "$work/paused-icons.png" null: 2>&1)" != 0 ] || bad "the icon does not show the pause"
 driver menu r >/dev/null
 waitfor "$wlog" "fetched     A@USB\\LOG0002" 15
 

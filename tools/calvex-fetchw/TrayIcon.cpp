@@ -29,23 +29,30 @@ HICON LoadFetchIcon(HINSTANCE instance) {
     return icon ? static_cast<HICON>(icon) : LoadIconW(nullptr, IDI_APPLICATION);
 }
 
-// The icon with two bars over its lower right quarter, as media players show a pause.
+// The icon with two bars over its lower right quarter, as media players show a pause. Drawn in
+// a 32-bit bitmap: an icon with an alpha channel gets opaque bars, one without keeps its mask.
 HICON MakePausedIcon(HICON icon) {
     const int cx = GetSystemMetrics(SM_CXSMICON), cy = GetSystemMetrics(SM_CYSMICON);
-    const HDC screen = GetDC(nullptr);
-    const HDC dc = CreateCompatibleDC(screen);
-    const HBITMAP color = CreateCompatibleBitmap(screen, cx, cy);
+    BITMAPINFO format = {};
+    format.bmiHeader = {sizeof(BITMAPINFOHEADER), cx, -cy, 1, 32, BI_RGB, 0, 0, 0, 0, 0};
+    void* bits = nullptr;
+    const HBITMAP color = CreateDIBSection(nullptr, &format, DIB_RGB_COLORS, &bits, nullptr, 0);
     const HBITMAP mask = CreateBitmap(cx, cy, 1, 1, nullptr);
-    ReleaseDC(nullptr, screen);
+    const HDC dc = CreateCompatibleDC(nullptr);
+    if (!color || !mask || !dc) return nullptr;
     const HGDIOBJ old = SelectObject(dc, mask);
     DrawIconEx(dc, 0, 0, icon, cx, cy, 0, nullptr, DI_MASK);
     const RECT bars[] = {{cx / 2, cy / 2, cx / 2 + cx / 6, cy}, {cx - cx / 6, cy / 2, cx, cy}};
     for (const RECT& bar : bars) FillRect(dc, &bar, static_cast<HBRUSH>(GetStockObject(BLACK_BRUSH)));
     SelectObject(dc, color);
     DrawIconEx(dc, 0, 0, icon, cx, cy, 0, nullptr, DI_IMAGE);
-    const HBRUSH ink = CreateSolidBrush(RGB(32, 32, 160));
-    for (const RECT& bar : bars) FillRect(dc, &bar, ink);
-    DeleteObject(ink);
+    GdiFlush();
+    auto* pixels = static_cast<DWORD*>(bits);
+    bool alpha = false;
+    for (int i = 0; i < cx * cy; ++i) alpha = alpha || (pixels[i] >> 24) != 0;
+    for (const RECT& bar : bars)
+        for (int y = bar.top; y < bar.bottom; ++y)
+            for (int x = bar.left; x < bar.right; ++x) pixels[y * cx + x] = (alpha ? 0xFF000000u : 0u) | 0x2020A0u;
     SelectObject(dc, old);
     DeleteDC(dc);
     ICONINFO info = {TRUE, 0, 0, mask, color};
