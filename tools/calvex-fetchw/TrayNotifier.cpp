@@ -27,7 +27,13 @@ void TrayNotifier::SetIcon(TrayIcon* icon) {
 
 WatchView TrayNotifier::View() {
     std::lock_guard<std::mutex> hold(m_lock);
-    return m_view;
+    WatchView view = m_view;
+    // What is left of a timed pause now, not when it was told: its end stays where it was.
+    if (view.status.paused && view.status.pauseLeft) {
+        const ULONGLONG gone = m_clock() - m_pausedAt;
+        view.status.pauseLeft = gone < view.status.pauseLeft ? view.status.pauseLeft - gone : 1;
+    }
+    return view;
 }
 
 void TrayNotifier::Idle() {
@@ -54,6 +60,7 @@ void TrayNotifier::Paused(ULONGLONG left) {
     m_view.status.receiver.clear();
     m_view.status.paused = true;
     m_view.status.pauseLeft = left;
+    m_pausedAt = m_clock();
     if (!m_icon) return;
     m_icon->SetPaused(true);
     m_icon->SetTip(PausedTip(m_view.status, LocalNow()));

@@ -64,4 +64,5 @@ private:
     std::map<std::wstring, Said> m_said;  // by receiver: its last notice and its last pass
     std::mutex m_lock;
     WatchView m_view;
+    ULONGLONG m_pausedAt = 0;  // when the pause was told, by m_clock
 };
