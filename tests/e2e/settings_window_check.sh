@@ -28,10 +28,11 @@ receiver "$root/Calvex R8" 1 1000-0008 R8
 "$run" reg add "$key" /v FetchLayout /d '{receiver}\{doy2}' /f >/dev/null 2>&1
 
 probe() { "$run" "$build/settings_probe.exe" 2>/dev/null | tr -d '\r'; }
-shows() {  # shows NAME=VALUE...: until the window shows them all
+shows() {  # shows NAME=VALUE...: until the window shows them all; at once a failure when it is gone
   local want seen
   for _ in $(seq 1 40); do
     seen=$(probe) want=0
+    [ -n "$seen" ] || { bad "no settings window to show $*"; return 1; }
     for line in "$@"; do grep -qxF -- "$line" <<<"$seen" || want=1; done
     [ $want = 0 ] && return 0; sleep 0.25
   done
