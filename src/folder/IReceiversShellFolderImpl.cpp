@@ -87,16 +87,14 @@ HRESULT IReceiversShellFolderImpl::Init(IReceiversShellFolderImpl* parent, LPCIT
     return S_OK;
 }
 
-bool IReceiversShellFolderImpl::IsHeld(const char* method, LPCITEMIDLIST list) const {
+bool IReceiversShellFolderImpl::IsWhole(const char* method, LPCITEMIDLIST list) const {
     if (!m_pidlMgr) return false;
-    // A receiver folder holds files; a root folder (or one never initialised) receivers.
-    const bool filesLevel = m_ownPidl && IsReceiverType(m_pidlMgr->GetLastItemType(m_ownPidl.Get()));
-    const PidlCheck check = m_pidlMgr->Check(list, filesLevel ? LevelFile : LevelReceiver);
+    const PidlCheck check = m_pidlMgr->Check(list);
     if (check) return true;
     const char* prefix = "IReceiversShellFolderImpl::%s - malformed item identifier: item [%u] ";
     const std::string line = std::string(prefix) +
         (check.fault == PidlFault::ByteCount ? "counts [%u] bytes, fewer than its fixed fields\r\n"
-         : check.fault == PidlFault::Kind    ? "is of kind [%u], not held at this level\r\n"
+         : check.fault == PidlFault::Length  ? "ends past the size a list can count\r\n"
                                              : "has no name terminator inside it\r\n");
     TraceA(line.c_str(), method, check.item, check.value);
     return false;
@@ -216,7 +214,7 @@ STDMETHODIMP IReceiversShellFolderImpl::EnumObjects(HWND, SHCONTF grfFlags, IEnu
 
 STDMETHODIMP IReceiversShellFolderImpl::BindToObject(PCUIDLIST_RELATIVE pidl, IBindCtx*, REFIID riid, void** ppv) {
     if (ppv) *ppv = nullptr;
-    if (m_pidlMgr && !IsHeld("BindToObject", pidl)) return E_INVALIDARG;
+    if (m_pidlMgr && !IsWhole("BindToObject", pidl)) return E_INVALIDARG;
     const LPCITEMIDLIST last = m_pidlMgr ? m_pidlMgr->GetLastItem(pidl) : nullptr;
     TraceW(L"IReceiversShellFolderImpl::BindToObject   last=%s\r\n", KeyForm(last).c_str());
     TraceW(L"IReceiversShellFolderImpl::BindToObject   %s\r\n", KeyForm(pidl).c_str());
@@ -250,7 +248,7 @@ STDMETHODIMP IReceiversShellFolderImpl::CompareIDs(LPARAM lParam, PCUIDLIST_RELA
     TraceA("IReceiversShellFolderImpl::CompareIDs\r\n");
     // A damaged item sorts after every whole one, in either direction, and equal to another
     // damaged one: the order stays consistent, so a sort over it cannot go wrong.
-    const bool whole1 = IsHeld("CompareIDs", pidl1), whole2 = IsHeld("CompareIDs", pidl2);
+    const bool whole1 = IsWhole("CompareIDs", pidl1), whole2 = IsWhole("CompareIDs", pidl2);
     if (!whole1 || !whole2) return whole1 == whole2 ? 0 : whole1 ? -1 : 1;
     const ReceiverItemData* item1 = m_pidlMgr ? m_pidlMgr->GetData(pidl1) : nullptr;
     const ReceiverItemData* item2 = m_pidlMgr ? m_pidlMgr->GetData(pidl2) : nullptr;
@@ -313,7 +311,7 @@ STDMETHODIMP IReceiversShellFolderImpl::GetAttributesOf(UINT cidl, PCUITEMID_CHI
     // The caller's mask is replaced, not narrowed.
     *rgfInOut = 0xFFFFFFFF;
     for (UINT i = 0; i < cidl && apidl && m_pidlMgr; ++i) {
-        if (!IsHeld("GetAttributesOf", apidl[i])) {
+        if (!IsWhole("GetAttributesOf", apidl[i])) {
             *rgfInOut = 0;  // nothing may be done with it
             return E_INVALIDARG;
         }
@@ -330,7 +328,7 @@ STDMETHODIMP IReceiversShellFolderImpl::GetUIObjectOf(HWND, UINT cidl, PCUITEMID
     if (!ppv) return E_INVALIDARG;
     *ppv = nullptr;
     if (cidl != 1) return E_FAIL;
-    if (!apidl || !apidl[0] || !m_pidlMgr || !IsHeld("GetUIObjectOf", apidl[0])) return E_INVALIDARG;
+    if (!apidl || !apidl[0] || !m_pidlMgr || !IsWhole("GetUIObjectOf", apidl[0])) return E_INVALIDARG;
     const bool itemObject = IsEqualIID(riid, IID_IExtractIconW) || IsEqualIID(riid, IID_IQueryInfo) ||
                             IsEqualIID(riid, IID_IContextMenu) || IsEqualIID(riid, IID_IDataObject);
     if (!itemObject) return E_NOINTERFACE;
@@ -359,7 +357,7 @@ HRESULT IReceiversShellFolderImpl::CreateItemObject(LPCITEMIDLIST item, REFIID r
 
 STDMETHODIMP IReceiversShellFolderImpl::GetDisplayNameOf(PCUITEMID_CHILD pidl, SHGDNF uFlags, STRRET* pName) {
     TraceA("IReceiversShellFolderImpl::GetDisplayNameOf\r\n");
-    if (!pName || !m_malloc || !IsHeld("GetDisplayNameOf", pidl)) return E_INVALIDARG;
+    if (!pName || !m_malloc || !IsWhole("GetDisplayNameOf", pidl)) return E_INVALIDARG;
     std::wstring name;
     HRESULT hr = DisplayName(pidl, uFlags, name);
     if (FAILED(hr)) return hr;

@@ -90,9 +90,9 @@ public:
     size_t ViewWindowCount();
 
 private:
-    // True when a list handed in can be read as one of this folder's items (or a path below
-    // one); otherwise the reason goes to the trace under `method`.
-    bool IsHeld(const char* method, LPCITEMIDLIST list) const;
+    // True when a list handed in can be read without leaving its bytes, whatever kinds it
+    // holds; otherwise the reason goes to the trace under `method`.
+    bool IsWhole(const char* method, LPCITEMIDLIST list) const;
     std::wstring KeyForm(LPCITEMIDLIST list) const;
     std::wstring DisplayForm(LPCITEMIDLIST list) const;
     HRESULT InitRootCollections();

@@ -14,6 +14,8 @@ const size_t kItemOverhead = 27;
 // Longest name whose cb still fits 16 bits; longer names are refused rather than wrapped.
 const size_t kMaxNameLength = (0xFFFF - kItemOverhead) / 2 - 1;
 const size_t kWorkBufferLength = 260;
+// GetSize counts a list in 32 bits.
+const ULONGLONG kMaxListSize = 0xFFFFFFFFull;
 
 // Items after the first start at odd addresses: read and write them bytewise.
 USHORT ReadCb(const void* item) {
@@ -26,15 +28,6 @@ DWORD ReadType(const void* item) {
     DWORD type;
     memcpy(&type, static_cast<const BYTE*>(item) + offsetof(ReceiverItem, data.type), sizeof type);
     return type;
-}
-
-const UINT kNoLevel = 0xFFFFFFFF;
-
-// The level an item of this kind stands at; kinds never made stand at none.
-UINT LevelOf(DWORD type) {
-    if (IsRootType(type)) return LevelRoot;
-    if (IsReceiverType(type)) return LevelReceiver;
-    return IsFileType(type) ? LevelFile : kNoLevel;
 }
 
 // True when a zero unit ends the name before the item does.
@@ -237,17 +230,19 @@ DWORD CReceiversPidlMgr::GetLastItemType(LPCITEMIDLIST list) const {
     return last ? ReadType(last) : 0;
 }
 
-PidlCheck CReceiversPidlMgr::Check(LPCITEMIDLIST list, ItemLevel firstLevel) const {
+PidlCheck CReceiversPidlMgr::Check(LPCITEMIDLIST list) const {
     PidlCheck check;
+    // The walk ends at the terminator: every step is at least the fixed fields long and reads
+    // only inside the item it steps over. It stops where the size would pass what GetSize's
+    // 32 bits count, since Copy and Concatenate allocate by that count and copy the real bytes.
     const BYTE* item = reinterpret_cast<const BYTE*>(list);
-    for (UINT level = firstLevel; item; ++level, ++check.item) {
+    for (ULONGLONG size = sizeof(USHORT); item; ++check.item) {
         const USHORT cb = ReadCb(item);
         if (cb == 0) return check;
         if (cb < kNameOffset + sizeof(WCHAR)) return check.fault = PidlFault::ByteCount, check.value = cb, check;
-        // Nothing stands below a file, so at most three items are ever walked.
-        const DWORD type = ReadType(item);
-        if (LevelOf(type) != level) return check.fault = PidlFault::Kind, check.value = type, check;
         if (!HasTerminatedName(item, cb)) return check.fault = PidlFault::Name, check;
+        size += cb;
+        if (size > kMaxListSize) return check.fault = PidlFault::Length, check;
         item += cb;
     }
     return check;

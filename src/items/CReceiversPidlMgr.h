@@ -24,15 +24,12 @@ inline bool IsRootType(DWORD type) { return type == ItemTypeCalvexRoot || type =
 inline bool IsReceiverType(DWORD type) { return type == ItemTypeCalvexReceiver || type == ItemTypeBrennorReceiver; }
 inline bool IsFileType(DWORD type) { return type == ItemTypeFile; }
 
-// Levels of the namespace, top down: what the items of a list are, in order.
-enum ItemLevel : UINT { LevelRoot = 0, LevelReceiver = 1, LevelFile = 2 };
-
 // What is wrong with a list that came from outside, and where.
-enum class PidlFault { None, ByteCount, Name, Kind };
+enum class PidlFault { None, ByteCount, Name, Length };
 struct PidlCheck {
     PidlFault fault = PidlFault::None;
     UINT item = 0;    // 0-based index of the item at fault
-    DWORD value = 0;  // its byte count (ByteCount) or kind (Kind)
+    DWORD value = 0;  // its byte count (ByteCount)
     explicit operator bool() const { return fault == PidlFault::None; }
 };
 
@@ -92,10 +89,11 @@ public:
 
     // Lists handed in by the shell may come from disk (shortcuts, saved views) or from another
     // program, damaged or not ours. Nothing of such a list is read before it passes: every
-    // item's count covers the fixed fields, its name ends inside it, the items go down the
-    // levels one at a time from firstLevel, and nothing follows a file. Only the count of an
-    // item and the bytes inside it are read. Null and empty lists pass: they name nothing.
-    PidlCheck Check(LPCITEMIDLIST list, ItemLevel firstLevel) const;
+    // item's count covers the fixed fields and its name ends inside it, and the whole list
+    // adds up to a size GetSize can count. Only memory decides: an item of any kind that is
+    // whole inside its bytes passes, and the folder answers for it as for any other. Only the
+    // count of an item and the bytes inside it are read. Null and empty lists pass.
+    PidlCheck Check(LPCITEMIDLIST list) const;
 
     // The item path of the list ("\"-joined; receivers as model@port unless keepKeys).
     // Null buffer: the size to allocate, terminator included.

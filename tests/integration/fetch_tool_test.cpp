@@ -201,7 +201,9 @@ TEST_F(FetchToolTest, MoveDeletesExactlyTheFilesWhoseCopiesAreProven) {
         {L"M1", L""}, {L"MF", L"FailAtPercent=50"}, {L"MG", L"GrowAtPercent=50"}, {L"MR", L""}, {L"MT", L"RetimeAtPercent=50"}};
     for (const auto& r : receivers)
         tree.AddReceiver({r.first, 1, L"Test receiver", r.first, r.first, 2, L"", {L"[Transfer]", L"Rate=40000", r.second,
-                          L"[Fail]", wcscmp(r.first, L"MR") ? L"" : L"IReceiverFile.Delete=0x80070005"}});
+                          L"[Fail]", wcscmp(r.first, L"MR") ? L"" : L"IReceiverFile.Delete=0x80070005",
+                          // still being logged: it grows, its time stays the one the logging began at
+                          L"[Times]", wcscmp(r.first, L"MG") ? L"" : L"GROWS=2026-10-20 15:00:00"}});
     for (const wchar_t* file : {L"M1\\SAME", L"M1\\DIFFERS2", L"MF\\DIFFERS", L"MG\\GROWS", L"MR\\REFUSED", L"MT\\RETIMED"})
         tree.AddFile(std::wstring(file, 2), file + 3, 30000);
     DeviceSimScope scope(tree.Root());

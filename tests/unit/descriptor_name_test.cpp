@@ -60,6 +60,12 @@ TEST(DescriptorNameTest, RefusesOrMakesSafeEveryHostileForm) {
         {std::wstring(255, L'n'), Refused},
     };
     for (const NameCase& row : rows) ExpectRule(row, MakeSafeDescriptorName(row.given, row.target));
+    // Through extended paths (calvex-fetch): past 260 in all, no name over 255 with the suffix.
+    const NameCase deep[] = {
+        {std::wstring(240, L'n'), std::wstring(240, L'n'), 200}, {std::wstring(241, L'n'), Refused, 200},
+        {L"s\\" + std::wstring(240, L'n'), L"s\\" + std::wstring(240, L'n'), 300}, {std::wstring(256, L's') + L"\\n", Refused},
+        {L"n", Refused, kLongPathLimit - 16}};
+    for (const NameCase& row : deep) ExpectRule(row, MakeSafeDescriptorName(row.given, row.target, kLongPathLimit));
     for (const std::wstring device : {L"COM", L"lpt"}) {
         for (wchar_t digit = L'1'; digit <= L'9'; ++digit) {
             const std::wstring name = device + digit + L".qpr";

@@ -28,7 +28,8 @@ TEST(LayoutPatternTest, ExpandsEveryFieldFromTheReceiversOwnDate) {
         {L"{receiver}\\{yyyy}\\{doy}", Day(2026, 12, 31), L"Q7_RTK@COM3\\2026\\365"},
         {L"{receiver}\\{yyyy}\\{doy}", Day(2027, 1, 1, 0, 0), L"Q7_RTK@COM3\\2027\\001"},
         {L"{receiver}/{yyyy}/{doy}", Day(2028, 12, 31), L"Q7_RTK@COM3\\2028\\366"},
-        {L"{doy}", Day(2028, 3, 1), L"061"}, {L"{doy}", Day(2100, 3, 1), L"060"}, {L"{doy}", Day(2000, 3, 1), L"061"},
+        {L"{doy}", Day(2028, 2, 28), L"059"}, {L"{doy}", Day(2028, 2, 29), L"060"}, {L"{doy}", Day(2028, 3, 1), L"061"},
+        {L"{doy}", Day(2027, 2, 28), L"059"}, {L"{doy}", Day(2027, 3, 1), L"060"}, {L"{doy}", Day(2028, 1, 31), L"031"}, {L"{doy}", Day(2100, 3, 1), L"060"}, {L"{doy}", Day(2000, 3, 1), L"061"},
         {L"{doy}", Day(2026, 11, 1, 1, 30), L"305"},  // the zone's daylight saving change changes nothing
         {L"{yyyy}-{mm}-{dd}\\{serial}", Day(2026, 3, 9), L"2026-03-09\\5211-40125"},
         {L"{brand}\\{model} {yy}", Day(2009, 7, 4), L"Calvex\\Q7_RTK 09"},
@@ -86,7 +87,8 @@ TEST(LayoutPatternTest, ShowsTheReceiversPlaceAndRefusesFieldsThatMakeNoName) {
     EXPECT_TRUE(layout.IsDated());
     EXPECT_EQ(L"Q7_RTK@COM3\\{yyyy}\\{doy}", layout.Shown(kQ7));
     EXPECT_TRUE(layout.Check({L"..", L"1", L"M", L"Calvex"}, 20).refused);
-    EXPECT_TRUE(layout.Check(kQ7, MAX_PATH - 30).refused) << "too long for the target";
+    EXPECT_FALSE(layout.Check(kQ7, MAX_PATH - 30).refused) << "a deep target, written through extended paths";
+    EXPECT_TRUE(layout.Check(kQ7, 32750).refused) << "too long even for an extended path";
     ASSERT_TRUE(layout.Parse(L"{serial}", error));
     EXPECT_FALSE(layout.IsDated());
     EXPECT_TRUE(layout.Check({L"Q9@USB", L"", L"Q9", L"Calvex"}, 20).refused) << "an empty serial";

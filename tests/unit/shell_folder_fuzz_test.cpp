@@ -1,8 +1,8 @@
 // Guards the folder's entry points against identifiers from outside: lists of the right
 // overall shape but wrong inside (counts below the fixed fields, names without terminator,
-// counts wrapped by long names, kinds that do not belong, lists too deep or too long) and
+// counts wrapped by long names), whole lists of any kind at any level, deep or long, and
 // random bytes, each against a no-access page so that a read of one byte past it faults at
-// once. A failure or a fault prints the case's seed: CALVEX_FUZZ_SEED=<seed>
+// once. Damaged lists are refused; whole ones get the answer their kinds give. A failure or a fault prints the case's seed: CALVEX_FUZZ_SEED=<seed>
 // CALVEX_FUZZ_CASES=1 runs that case alone.
 #include <shlobj.h>
 #include <shlwapi.h>
@@ -37,8 +37,16 @@ unsigned EnvNumber(const char* name, unsigned fallback) {
     return value && *value ? static_cast<unsigned>(strtoul(value, nullptr, 10)) : fallback;
 }
 
-enum Shape { Whole, ShortCount, Unterminated, Wrapped, WrongKind, Deep, Long, RandomBytes, ShapeCount };
-const char* const kShapes[] = {"whole", "short count", "unterminated name", "wrapped count", "wrong kind", "deep", "long", "random bytes"};
+enum Shape { Whole, ShortCount, Unterminated, Wrapped, AnyKind, Deep, Long, RandomBytes, ShapeCount };
+const char* const kShapes[] = {"whole", "short count", "unterminated name", "wrapped count", "any kind at any level", "deep", "long", "random bytes"};
+bool IsDamaged(Shape shape) { return shape == ShortCount || shape == Unterminated || shape == Wrapped; }
+
+// What a whole selection's kinds give, worked out apart from the folder's own code.
+SFGAOF AttributesOf(DWORD lastKind) {
+    if (lastKind == 6) return SFGAO_REMOVABLE | SFGAO_CANCOPY;
+    if (lastKind == 3 || lastKind == 4) return SFGAO_FOLDER | SFGAO_REMOVABLE;
+    return SFGAO_HASSUBFOLDER | SFGAO_FOLDER | SFGAO_REMOVABLE;
+}
 enum Entry { Attributes, Compare, DisplayName, UIObject, Bind, EntryCount };
 const char* const kEntries[] = {"GetAttributesOf", "CompareIDs", "GetDisplayNameOf", "GetUIObjectOf", "BindToObject"};
 
@@ -80,15 +88,13 @@ std::vector<RawItem> ListMaker::Items(Shape shape) {
         last.name = Name(Int(32754, 32780));
         last.cb = static_cast<USHORT>((last.name.size() + 1) * 2 + 27);
     }
-    if (shape == WrongKind) {
-        const size_t index = Int(0, static_cast<int>(items.size()) - 1);
-        const bool fileSlot = m_filesLevel || index > 0;
-        const DWORD never[] = {0, 1, 2, 5, 7, 0xFFFFFFFF, fileSlot ? 3u : 6u, fileSlot ? 4u : 6u};
-        items[index].type = never[Int(0, 7)];
+    if (shape == AnyKind) {
+        const DWORD kinds[] = {0, 1, 2, 3, 4, 5, 6, 7, 0xFFFFFFFF};
+        for (RawItem& item : items) item.type = kinds[Int(0, 8)];
     }
     if (shape == Deep || shape == Long) {  // items go on past the file
         if (!m_filesLevel && items.size() == 1) items.push_back(Item(ItemTypeFile));
-        for (int extra = shape == Deep ? Int(1, 40) : Int(200, 2000); extra > 0; --extra) items.push_back(Item(Int(3, 6)));
+        for (int extra = shape == Deep ? Int(1, 40) : Int(200, 2000); extra > 0; --extra) items.push_back(Item(Int(0, 7)));
     }
     if (shape == RandomBytes) {
         items.clear();
@@ -119,7 +125,8 @@ protected:
         return folder;
     }
     void Run(unsigned seed);
-    void Call(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list, LPCITEMIDLIST whole, int held);
+    void Call(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list, LPCITEMIDLIST whole, bool damaged);
+    void CallWhole(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list, LPCITEMIDLIST whole);
     void Expect(bool ok, const char* what) {
         if (!ok && ++failures <= 20) ADD_FAILURE() << what << " in " << g_case;
     }
@@ -144,41 +151,73 @@ void ShellFolderFuzzTest::Run(unsigned seed) {
     const char* folderNames[] = {"Calvex root", "Brennor root", "receiver"};
     g_case = "seed " + std::to_string(seed) + ": " + kShapes[shape] + " list to " + kEntries[entry] + " of the " +
              folderNames[folderIndex] + " folder: " + list.Hex();
-    // Whole lists must be taken, damaged ones refused; random bytes may be either.
-    Call(random, entry, folders[folderIndex], list.Get(), whole.Get(), shape == Whole ? 1 : shape == RandomBytes ? -1 : 0);
+    // Whole lists of any kinds get what their kinds give, damaged ones are refused; random
+    // bytes may be either, but are never read past.
+    if (shape == RandomBytes || IsDamaged(shape)) Call(random, entry, folders[folderIndex], list.Get(), whole.Get(), shape != RandomBytes);
+    else CallWhole(random, entry, folders[folderIndex], list.Get(), whole.Get());
 }
 
 void ShellFolderFuzzTest::Call(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list,
-                               LPCITEMIDLIST whole, int held) {
+                               LPCITEMIDLIST whole, bool damaged) {
     LPCITEMIDLIST lists[] = {whole, list};
-    const bool refused = held == 0;
     void* object = nullptr;
     HRESULT hr = S_OK;
     if (entry == Attributes) {
         SFGAOF attributes = 0;
         const UINT count = static_cast<UINT>(random.Int(1, 2));  // alone, or after a whole item
         hr = folder->GetAttributesOf(count, &lists[2 - count], &attributes);
-        if (held >= 0) Expect(hr == (refused ? E_INVALIDARG : S_OK) && (attributes == 0) == refused, "attributes");
+        if (damaged) Expect(hr == E_INVALIDARG && attributes == 0, "attributes");
     } else if (entry == Compare) {
         const LPARAM column = random.Int(-3, 3);
         const HRESULT forth = folder->CompareIDs(column, list, whole), back = folder->CompareIDs(column, whole, list);
         const HRESULT self = folder->CompareIDs(column, list, list);
-        if (refused) Expect(forth == 1 && back == -1 && self == 0, "a damaged item sorts last");
-        if (held == 1 && (column == 0 || column == 1)) Expect((forth > 0) == (back < 0), "names compare both ways alike");
+        if (damaged) Expect(forth == 1 && back == -1 && self == 0, "a damaged item sorts last");
     } else if (entry == DisplayName) {
         const SHGDNF flags[] = {SHGDN_NORMAL, SHGDN_INFOLDER, SHGDN_FORPARSING, SHGDN_FORPARSING | SHGDN_INFOLDER};
         STRRET name = {};
         wchar_t small[8];
         hr = folder->GetDisplayNameOf(list, flags[random.Int(0, 3)], &name);
         if (hr == S_OK) StrRetToBufW(&name, list, small, random.Int(1, 8));
-        if (held >= 0) Expect(hr == (refused ? E_INVALIDARG : S_OK), "display name");
+        if (damaged) Expect(hr == E_INVALIDARG, "display name");
     } else {
         const IID* iids[] = {&IID_IExtractIconW, &IID_IQueryInfo, &IID_IContextMenu, &IID_IDataObject};
         hr = entry == Bind ? folder->BindToObject(list, nullptr, IID_IShellFolder, &object)
                            : folder->GetUIObjectOf(nullptr, 1, &lists[1], *iids[random.Int(0, 3)], nullptr, &object);
         if (object) static_cast<IUnknown*>(object)->Release();
-        if (refused) Expect(hr == E_INVALIDARG && !object, "item object or bind");
+        if (damaged) Expect(hr == E_INVALIDARG && !object, "item object or bind");
     }
+}
+
+void ShellFolderFuzzTest::CallWhole(ListMaker& random, Entry entry, IShellFolder* folder, LPCITEMIDLIST list,
+                                    LPCITEMIDLIST whole) {
+    const DWORD last = mgr.GetLastItemType(list);
+    void* object = nullptr;
+    if (entry == Attributes) {
+        LPCITEMIDLIST lists[] = {whole, list};
+        SFGAOF attributes = SFGAO_CANDELETE;
+        const UINT count = static_cast<UINT>(random.Int(1, 2));  // alone, or after a whole item
+        const SFGAOF expected = AttributesOf(last) & (count == 2 ? AttributesOf(mgr.GetLastItemType(whole)) : ~0u);
+        Expect(folder->GetAttributesOf(count, &lists[2 - count], &attributes) == S_OK && attributes == expected, "attributes of the kinds");
+    } else if (entry == Compare) {
+        const LPARAM column = random.Int(-3, 3);
+        const HRESULT forth = folder->CompareIDs(column, list, whole), back = folder->CompareIDs(column, whole, list);
+        if (mgr.GetData(list)->type != mgr.GetData(whole)->type) Expect(forth == 0 && back == 0, "kinds differ: equal");
+        else if (column == 0 || column == 1 || column == -1) Expect((forth > 0) == (back < 0), "names compare both ways alike");
+    } else if (entry == DisplayName) {
+        STRRET name = {};
+        const HRESULT hr = folder->GetDisplayNameOf(list, random.Int(0, 1) ? SHGDN_FORPARSING : SHGDN_NORMAL, &name);
+        if (hr == S_OK && name.uType == STRRET_WSTR) CoTaskMemFree(name.pOleStr);
+        // Only a receiver whose key has fewer than two fields names nothing; that is still S_OK.
+        Expect(hr == S_OK, "display name");
+    } else if (entry == UIObject) {
+        LPCITEMIDLIST lists[] = {list};
+        const IID* iids[] = {&IID_IExtractIconW, &IID_IQueryInfo, &IID_IContextMenu};
+        Expect(folder->GetUIObjectOf(nullptr, 1, lists, *iids[random.Int(0, 2)], nullptr, &object) == S_OK && object, "item object");
+    } else {
+        const HRESULT hr = folder->BindToObject(list, nullptr, IID_IShellFolder, &object);
+        if (last == 6) Expect(hr == E_INVALIDARG && !object, "a file is no folder");
+    }
+    if (object) static_cast<IUnknown*>(object)->Release();
 }
 }  // namespace
 

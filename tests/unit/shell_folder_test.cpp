@@ -49,25 +49,35 @@ protected:
 };
 }  // namespace
 
+// Every whole item gets what its kind gives, at either level: the folder does not judge which
+// kinds belong where (a saved selection may mix them).
 TEST_F(ShellFolderTest, GetAttributesOfReplacesTheMaskWithWhatAllItemsShare) {
-    UniquePidl brennorItem = Item(4, kKey), receiverFile(mgr, mgr.Concatenate(receiverItem.Get(), file.Get()));
-    struct { IShellFolder* folder; std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
-        {root.Get(), {}, 0xFFFFFFFF},
-        {receiver.Get(), {file.Get()}, 0x02000001},
-        {root.Get(), {receiverItem.Get()}, 0x22000000},
-        {root.Get(), {brennorItem.Get(), receiverItem.Get()}, 0x22000000},
-        {root.Get(), {receiverItem.Get(), receiverFile.Get()}, 0x02000000},  // a receiver and a file below one
+    UniquePidl brennorItem = Item(4, kKey), rootItem = Item(1, L"Calvex Receivers"), noItem = Item(5, kKey);
+    UniquePidl unknown = Item(0x77, kKey), receiverFile(mgr, mgr.Concatenate(receiverItem.Get(), file.Get()));
+    struct { std::vector<LPCITEMIDLIST> items; SFGAOF expected; } cases[] = {
+        {{}, 0xFFFFFFFF},
+        {{file.Get()}, 0x02000001},
+        {{receiverItem.Get()}, 0x22000000},
+        {{brennorItem.Get(), receiverItem.Get()}, 0x22000000},
+        {{rootItem.Get()}, 0xA2000000},
+        {{noItem.Get()}, 0xA2000000},
+        {{unknown.Get()}, 0xA2000000},
+        {{receiverItem.Get(), file.Get()}, 0x02000000},
+        {{receiverItem.Get(), receiverFile.Get()}, 0x02000000},  // a receiver and a file below one
     };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.items.size());
-        SFGAOF attributes = SFGAO_CANDELETE | SFGAO_CANMOVE;  // asked for, and ignored
-        EXPECT_EQ(S_OK, c.folder->GetAttributesOf(static_cast<UINT>(c.items.size()),
-                                                  const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
-        EXPECT_EQ(c.expected, attributes);
+    for (IShellFolder* folder : {static_cast<IShellFolder*>(root.Get()), static_cast<IShellFolder*>(receiver.Get())}) {
+        for (const auto& c : cases) {
+            SCOPED_TRACE(testing::Message() << (folder == root.Get() ? "brand folder, row " : "receiver folder, row ") << &c - cases);
+            SFGAOF attributes = SFGAO_CANDELETE | SFGAO_CANMOVE;  // asked for, and ignored
+            EXPECT_EQ(S_OK, folder->GetAttributesOf(static_cast<UINT>(c.items.size()),
+                                                    const_cast<LPCITEMIDLIST*>(c.items.data()), &attributes));
+            EXPECT_EQ(c.expected, attributes);
+            EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::GetAttributesOf - attributes is collected [" +
+                                                   std::to_string(c.expected) + "]\r\n"));
+        }
     }
     LPCITEMIDLIST one[] = {file.Get()};
     EXPECT_EQ(S_FALSE, receiver->GetAttributesOf(1, one, nullptr));
-    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::GetAttributesOf - attributes is collected [33554432]\r\n"));
 }
 
 TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
@@ -75,29 +85,54 @@ TEST_F(ShellFolderTest, CompareIDsReturnsTheProductWithTheSignedColumn) {
     UniquePidl later = Item(6, L"C.qpr", 3, 40001.0), huge = Item(6, L"H.qpr", 0x80000000u, 0);
     UniquePidl one = Item(6, L"O.qpr", 1, 0), receiverA = Item(3, L"ABC!m!p"), receiverB = Item(3, L"abd!m!p");
     UniquePidl receiverA2 = Item(3, L"abc!M!P"), brennorA = Item(4, L"ABC!m!p");
-    IShellFolder* files = receiver.Get();
-    struct { IShellFolder* folder; LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
-        {files, 2, big.Get(), small.Get(), 14},                 // 7 * 2
-        {files, -2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
-        {files, 2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
-        {files, 3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
-        {files, 3, small.Get(), big.Get(), 3},                  // ... in both orders
-        {files, 3, big.Get(), later.Get(), -3},
-        {files, 3, later.Get(), big.Get(), 3},
-        {root.Get(), 2, receiverA.Get(), receiverB.Get(), 0},   // size and time only for files
-        {root.Get(), 0, receiverA.Get(), brennorA.Get(), 0},    // different kinds
-        {root.Get(), 0, receiverA.Get(), receiverA2.Get(), 0},  // names ignore case
+    UniquePidl hundred = Item(6, L"D.qpr", 100, 40000), fifty = Item(6, L"E.qpr", 50, 40000);
+    struct { LPARAM lParam; LPCITEMIDLIST first, second; HRESULT expected; } cases[] = {
+        {2, big.Get(), small.Get(), 14},                 // 7 * 2
+        {-2, big.Get(), small.Get(), -14},               // descending: a larger first size is negative
+        {2, hundred.Get(), fifty.Get(), 100},
+        {-2, hundred.Get(), fifty.Get(), -100},
+        {2, huge.Get(), one.Get(), -2},  // 0x7FFFFFFF (32-bit difference) * 2, low 32 bits
+        {3, big.Get(), small.Get(), 3},                  // equal times are +1 ...
+        {3, small.Get(), big.Get(), 3},                  // ... in both orders
+        {3, big.Get(), later.Get(), -3},
+        {3, later.Get(), big.Get(), 3},
+        {2, receiverA.Get(), receiverB.Get(), 0},   // size and time only for files
+        {0, receiverA.Get(), brennorA.Get(), 0},    // different kinds
+        {1, big.Get(), receiverA.Get(), 0},
+        {0, receiverA.Get(), receiverA2.Get(), 0},  // names ignore case
     };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
-        EXPECT_EQ(c.expected, c.folder->CompareIDs(c.lParam, c.first, c.second));
+    // The same at the brand folder and in a receiver: kinds decide, not the level.
+    for (IShellFolder* folder : {static_cast<IShellFolder*>(root.Get()), static_cast<IShellFolder*>(receiver.Get())}) {
+        for (const auto& c : cases) {
+            SCOPED_TRACE(testing::Message() << "lParam " << c.lParam << " expected " << c.expected);
+            EXPECT_EQ(c.expected, folder->CompareIDs(c.lParam, c.first, c.second));
+        }
+        // Names: the sign of _wcsicmp, multiplied out.
+        EXPECT_GT(folder->CompareIDs(1, big.Get(), small.Get()), 0);
+        EXPECT_LT(folder->CompareIDs(1, small.Get(), big.Get()), 0);
+        const HRESULT ascending = folder->CompareIDs(0, receiverA.Get(), receiverB.Get());
+        EXPECT_LT(ascending, 0);
+        EXPECT_EQ(-ascending, folder->CompareIDs(-1, receiverA.Get(), receiverB.Get()));
+        EXPECT_EQ(ascending * 4, folder->CompareIDs(4, receiverA.Get(), receiverB.Get()));
     }
-    // Names: the sign of _wcsicmp, multiplied out.
-    const HRESULT ascending = root->CompareIDs(0, receiverA.Get(), receiverB.Get());
-    EXPECT_LT(ascending, 0);
-    EXPECT_EQ(-ascending, root->CompareIDs(-1, receiverA.Get(), receiverB.Get()));
-    EXPECT_EQ(ascending * 4, root->CompareIDs(4, receiverA.Get(), receiverB.Get()));
     EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CompareIDs ID1=ABC!m!p, ID2=abd!m!p\r\n"));
+    EXPECT_TRUE(testsupport::TraceContains("IReceiversShellFolderImpl::CompareIDs ID1=B.qpr, ID2=A.qpr\r\n"));
+}
+
+// An item's icon is its kind less one, whichever folder it is handed to.
+TEST_F(ShellFolderTest, EveryKindGetsItsIconAtBothLevels) {
+    for (IShellFolder* folder : {static_cast<IShellFolder*>(root.Get()), static_cast<IShellFolder*>(receiver.Get())}) {
+        for (DWORD kind : {1u, 2u, 3u, 4u, 5u, 6u, 9u}) {
+            UniquePidl item = Item(kind, kKey);
+            LPCITEMIDLIST items[] = {item.Get()};
+            ComPtr<IExtractIconW> icon;
+            ASSERT_EQ(S_OK, folder->GetUIObjectOf(nullptr, 1, items, IID_IExtractIconW, nullptr, icon.PutVoid())) << kind;
+            int index = -99;
+            UINT flags = 0;
+            EXPECT_EQ(S_OK, icon->GetIconLocation(0, nullptr, 0, &index, &flags));
+            EXPECT_EQ(static_cast<int>(kind) - 1, index) << kind;
+        }
+    }
 }
 
 TEST_F(ShellFolderTest, ParseDisplayNameGivesTheItemsTheNameNames) {
@@ -139,6 +174,8 @@ TEST_F(ShellFolderTest, GetDisplayNameOfFollowsTheFlags) {
          S_OK, std::wstring(L"::{E65CDE76-B4FC-447f-A9DD-A011176B14E7}\\") + kKey},
         {receiver.Get(), file.Get(), SHGDN_FORPARSING, S_OK, calvexParsing + L"\\FILE.qpr"},
         {receiver.Get(), file.Get(), SHGDN_NORMAL, S_OK, L"FILE.qpr"},
+        {root.Get(), file.Get(), SHGDN_FORPARSING, S_OK, std::wstring(kCalvexRoot) + L"\\FILE.qpr"},  // any kind, any level
+        {receiver.Get(), receiverItem.Get(), SHGDN_NORMAL, S_OK, L"Z/5@COM3"},
     };
     for (auto& c : cases) {
         SCOPED_TRACE(testing::Message() << "flags 0x" << std::hex << c.flags);
@@ -224,12 +261,9 @@ TEST_F(ShellFolderTest, DamagedIdentifiersAreRefusedBeforeTheyAreRead) {
         {files, {{40, 6, L"ABCDEFGHIJK", false}}, Compare, "item [0] has no name terminator inside it"},
         {files, {{1, 6, wrapped}}, Data, "item [0] counts [1] bytes, fewer than its fixed fields"},
         {files, {{21, 6, wrapped}}, Compare, "item [0] has no name terminator inside it"},  // 32,764 units
-        {top, {Whole(1, L"Calvex Receivers")}, Attributes, "item [0] is of kind [1], not held at this level"},
-        {files, {Whole(4, kKey)}, Name, "item [0] is of kind [4], not held at this level"},
-        {top, {Whole(5, kKey)}, Icon, "item [0] is of kind [5], not held at this level"},
-        {top, {Whole(6, L"F.qpr")}, Bind, "item [0] is of kind [6], not held at this level"},
-        {top, {Whole(3, kKey), Whole(6, L"F"), Whole(6, L"G")}, Bind, "item [2] is of kind [6], not held at this level"},
-        {files, {Whole(6, L"F"), Whole(3, kKey)}, Attributes, "item [1] is of kind [3], not held at this level"},
+        // Damage after whole items of any kind is still found where it is.
+        {top, {Whole(6, L"F.qpr"), Whole(9, kKey), {12, 3, L""}}, Bind, "item [2] counts [12] bytes, fewer than its fixed fields"},
+        {files, {Whole(1, L"R"), {44, 5, L"ABCDEFGHIJKLMN", false}}, Attributes, "item [1] has no name terminator inside it"},
     };
     UniquePidl whole = Item(6, L"W.qpr", 5, 40000);
     for (const auto& row : rows) {

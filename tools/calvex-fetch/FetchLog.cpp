@@ -3,11 +3,12 @@
 #include <cstdio>
 
 #include "ConsoleText.h"
+#include "LongPath.h"
 #include "com/Handles.h"
 
 namespace {
 UniqueFile OpenForAppend(const std::wstring& path) {
-    return UniqueFile(CreateFileW(path.c_str(), FILE_APPEND_DATA, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
+    return UniqueFile(CreateFileW(LongPath(path).c_str(), FILE_APPEND_DATA, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE,
                                   nullptr, OPEN_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr));
 }
 
@@ -37,7 +38,7 @@ void FetchLog::Write(const std::wstring& line, const SYSTEMTIME& now) {
     LARGE_INTEGER size = {};
     if (file && GetFileSizeEx(file.Get(), &size) && static_cast<ULONGLONG>(size.QuadPart) >= kLogLimit) {
         file.Reset();
-        MoveFileExW(m_path.c_str(), (m_path + L".1").c_str(), MOVEFILE_REPLACE_EXISTING);
+        MoveFileExW(LongPath(m_path).c_str(), LongPath(m_path + L".1").c_str(), MOVEFILE_REPLACE_EXISTING);
         file = OpenForAppend(m_path);
         m_day = 0;
     }

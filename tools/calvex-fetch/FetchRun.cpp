@@ -12,6 +12,7 @@
 #include "DownloadDialogWatch.h"
 #include "FetchOptions.h"
 #include "LayoutPattern.h"
+#include "LongPath.h"
 #include "MessageBoxAnswerer.h"
 #include "ReceiverFetcher.h"
 #include "ReceiverList.h"
@@ -131,6 +132,12 @@ int Fetch(const FetchOptions& options, const LayoutPattern& layout, FetchFront& 
     for (Receiver& receiver : receivers) {
         if (g_interrupted) break;
         FetchReceiver(receiver, target, options, layout, console, totals);
+        if (FAILED(totals.targetLost)) {
+            // One line for the lot: no other receiver's files could go anywhere either.
+            ++totals.failed;
+            console.Line(L"  FAILED      " + TargetLostText(target, totals.targetLost) + L"; nothing more is fetched");
+            break;
+        }
     }
     console.Line(Summary(options, totals, GetTickCount64() - started));
     return totals.failed || g_interrupted ? 1 : 0;
@@ -144,17 +151,11 @@ void StopFetch(bool windUp) {
     if (windUp) WaitForSingleObject(g_finished, 4000);
 }
 
-std::wstring FullPath(const std::wstring& path) {
-    wchar_t full[MAX_PATH];
-    const DWORD length = GetFullPathNameW(path.c_str(), MAX_PATH, full, nullptr);
-    std::wstring result = length && length < MAX_PATH ? full : path;
-    while (result.size() > 3 && (result.back() == L'\\' || result.back() == L'/')) result.pop_back();
-    return result;
-}
+std::wstring FullPath(const std::wstring& path) { return FullPlainPath(path); }
 
 bool IsWritableFolder(const std::wstring& target) {
-    CreateDirectoryW(target.c_str(), nullptr);
-    const std::wstring probe = target + L"\\.calvex-fetch-probe";
+    CreateDirectoryW(LongPath(target).c_str(), nullptr);
+    const std::wstring probe = LongPath(target + L"\\.calvex-fetch-probe");
     HANDLE file = CreateFileW(probe.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS,
                               FILE_ATTRIBUTE_TEMPORARY | FILE_FLAG_DELETE_ON_CLOSE, nullptr);
     if (file == INVALID_HANDLE_VALUE) return false;

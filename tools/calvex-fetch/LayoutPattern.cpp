@@ -127,7 +127,8 @@ bool LayoutPattern::Expand(const LayoutReceiver& receiver, const SYSTEMTIME* log
 SafeName LayoutPattern::Folder(const LayoutReceiver& receiver, const SYSTEMTIME& logged, size_t targetLength) const {
     std::wstring joined;
     SafeName refusal;
-    return Expand(receiver, &logged, joined, refusal) ? MakeSafeDescriptorName(joined, targetLength) : refusal;
+    // Written through extended paths: a deep target is limited only by each name's 255.
+    return Expand(receiver, &logged, joined, refusal) ? MakeSafeDescriptorName(joined, targetLength, kLongPathLimit) : refusal;
 }
 
 SafeName LayoutPattern::Check(const LayoutReceiver& receiver, size_t targetLength) const {

@@ -4,6 +4,7 @@
 
 #include "DescriptorName.h"
 #include "DownloadDialogWatch.h"
+#include "LongPath.h"
 #include "ShellNamespace.h"
 #include "VirtualFiles.h"
 #include "com/ComPtr.h"
@@ -22,29 +23,41 @@ bool MakeFolders(const std::wstring& target, const std::wstring& relative) {
     for (size_t at = 0; at <= relative.size();) {
         const size_t end = relative.find(L'\\', at);
         path += L"\\" + relative.substr(at, end - at);
-        if (!CreateDirectoryW(path.c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
+        if (!CreateDirectoryW(LongPath(path).c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
         if (end == std::wstring::npos) break;
         at = end + 1;
     }
     return true;
 }
+
+bool ReadWriteTime(const std::wstring& path, FILETIME& time) {
+    WIN32_FILE_ATTRIBUTE_DATA data = {};
+    if (!GetFileAttributesExW(LongPath(path).c_str(), GetFileExInfoStandard, &data)) return false;
+    time = data.ftLastWriteTime;
+    return true;
+}
 }  // namespace
 
-bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
+std::wstring TargetLostText(const std::wstring& target, HRESULT why) {
+    return L"the target cannot be reached: " + target + L" (" + HexText(why) + L")";
+}
+
+bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk) {
     const DWORD both = FD_FILESIZE | FD_WRITESTIME;
-    return (descriptor.dwFlags & both) == both && IsOnDiskAsDescribed(path, descriptor);
+    return (descriptor.dwFlags & both) == both && IsOnDiskAsDescribed(path, descriptor, disk);
 }
 
 void ReceiverFetcher::Run(IShellFolder* files, const Receiver& receiver, const std::wstring& target) {
     m_receiver = &receiver;
     m_target = target;
     m_receiverShown = m_watching ? m_layout.Shown(receiver.Fields()) + L"\\" : L"";
+    m_disk.reset(new TargetDisk(target));
     HRESULT hr = S_OK;
     std::vector<OwnedItem> items = ShellChildren(files, SHCONTF_NONFOLDERS, &hr);
     if (FAILED(hr)) Fail(L"(file list)", L"the receiver's files cannot be listed (" + HexText(hr) + L")");
     const int failedBefore = m_totals.failed;
     for (size_t i = 0; i < items.size(); ++i) {
-        if (m_interrupted || (m_givenUp && m_totals.failed > failedBefore)) return;
+        if (m_interrupted || FAILED(m_totals.targetLost) || (m_givenUp && m_totals.failed > failedBefore)) return;
         if (m_hold && m_hold()) {
             m_held = true;
             return;
@@ -80,11 +93,11 @@ void ReceiverFetcher::FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item) {
     const std::wstring name = descriptor.cFileName;
     std::wstring targetDir;
     if ((m_givenUp && m_givenUp->count(name)) || !Place(descriptor, targetDir)) return;
-    const SafeName safe = MakeSafeDescriptorName(name, targetDir.size());
+    const SafeName safe = MakeSafeDescriptorName(name, targetDir.size(), kLongPathLimit);
     if (safe.refused) return Fail(name, L"refused name: " + safe.reason);
     const std::wstring shown = m_shownFolder + (safe.reason.empty() ? name : name + L" as " + safe.name + L" (" + safe.reason + L")");
     const std::wstring path = targetDir + L"\\" + safe.name;
-    if (!m_options.all && IsAlreadyFetched(path, descriptor)) {
+    if (!m_options.all && IsAlreadyFetched(path, descriptor, *m_disk)) {
         ++m_totals.skipped;
         if (m_options.move) return Remove(descriptor, shown, false);
         // A watch compares again at every event: only news is worth a line there.
@@ -105,19 +118,40 @@ void ReceiverFetcher::Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor
     if (!Download(data, descriptor, name, targetDir, error)) {
         // Stopped by the user: nothing failed, the file simply was not kept.
         if (m_interrupted) return m_console.Line(L"  discarded   " + m_shownFolder + name + L" (stopped)");
-        return Fail(name, error);
+        return TargetReached() ? Fail(name, error) : void();
     }
     ++m_totals.fetched;
     m_totals.bytes += DescriptorSize(descriptor);
     const std::wstring line = shown + L"  " + ByteText(DescriptorSize(descriptor));
     if (!m_options.move) return m_console.Line(L"  fetched     " + line);
-    if (IsAlreadyFetched(path, descriptor)) return Remove(descriptor, shown, true);
+    FILETIME kept;
+    if (ReadWriteTime(path, kept)) m_disk->Learn(DescriptorWriteTime(descriptor), kept);
+    // Within the rule is proof; a time off by more than the disk can explain never is.
+    if (IsAlreadyFetched(path, descriptor, *m_disk)) return Remove(descriptor, shown, true);
     ++m_totals.kept;  // whole, but the disk cannot hold the receiver's time: no proof for a delete
     m_console.Line(L"  kept        " + line + L" (fetched; its time cannot be kept on this disk)");
 }
 
+bool ReceiverFetcher::TargetReached() {
+    const HRESULT why = TargetDisk::Reach(m_target);
+    if (FAILED(why)) m_totals.targetLost = why;
+    return SUCCEEDED(why);
+}
+
+// As Explorer does before a copy: a file that cannot fit is not started (the disk may still
+// fill up during the download, from elsewhere: then the write says so).
+bool ReceiverFetcher::HasRoom(const FILEDESCRIPTORW& descriptor, std::wstring& error) const {
+    ULONGLONG free = 0;
+    const ULONGLONG size = DescriptorSize(descriptor);
+    if (!m_disk->FreeBytes(free) || size <= free) return true;
+    error = L"not enough space on " + m_disk->Root() + L" for " + descriptor.cFileName + L" (" + ByteText(size) +
+            L" needed, " + ByteText(free) + L" free)";
+    return false;
+}
+
 bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& shownName,
                                const std::wstring& targetDir, std::wstring& error) {
+    if (!HasRoom(descriptor, error)) return false;
     if (!MakeFolders(m_target, targetDir.substr(m_target.size() + 1))) {
         error = L"cannot create " + targetDir;
         return false;
@@ -138,7 +172,7 @@ bool ReceiverFetcher::Download(IDataObject* data, const FILEDESCRIPTORW& descrip
         return false;
     }
     // S_OK: flushed, renamed with write-through, and read back in place (VirtualFiles.h).
-    return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error));
+    return SUCCEEDED(WriteVirtualFile(targetDir, descriptor, stream.Get(), error, kLongPathLimit));
 }
 
 // Only a file whose copy is proven whole gets here: fetched now (WriteVirtualFile's S_OK) or

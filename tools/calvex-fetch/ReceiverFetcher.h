@@ -18,6 +18,7 @@
 #include "LayoutPattern.h"
 #include "ReceiverFileDeleter.h"
 #include "ReceiverList.h"
+#include "TargetDisk.h"
 
 struct FetchTotals {
     int fetched = 0;  // or, in a dry run, would be fetched
@@ -27,7 +28,11 @@ struct FetchTotals {
     int kept = 0;     // safe in the target but left on the receiver: still changing, or the delete refused
     ULONGLONG bytes = 0;
     std::wstring firstFailure;  // "NAME: reason"
+    HRESULT targetLost = S_OK;  // why the target could not be reached: the run stopped there, no file counted failed
 };
+
+// The one line for a target that cannot be reached (a stick pulled, a share gone, a folder deleted).
+std::wstring TargetLostText(const std::wstring& target, HRESULT why);
 
 class ReceiverFetcher {
 public:
@@ -57,6 +62,10 @@ private:
     bool Place(const FILEDESCRIPTORW& descriptor, std::wstring& targetDir);
     void Fetch(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& targetDir,
                const std::wstring& path, const std::wstring& shown);
+    // False when the target is gone (totals.targetLost set): a failure there is no file's.
+    bool TargetReached();
+    // Room on the target's disk for the file, asked before its download; false with the reason.
+    bool HasRoom(const FILEDESCRIPTORW& descriptor, std::wstring& error) const;
     // Downloads and writes one file; false with the reason.
     bool Download(IDataObject* data, const FILEDESCRIPTORW& descriptor, const std::wstring& shownName,
                   const std::wstring& targetDir, std::wstring& error);
@@ -72,6 +81,7 @@ private:
     const Receiver* m_receiver = nullptr;
     std::wstring m_target;
     std::unique_ptr<ReceiverFileDeleter> m_deleter;
+    std::unique_ptr<TargetDisk> m_disk;  // the target's volume, looked at when the run starts
     std::wstring m_receiverShown;  // what the lines show before a name until the file's folder is known
     std::wstring m_shownFolder;    // what the lines show before a file's name
     bool m_watching = false;
@@ -81,6 +91,7 @@ private:
     bool m_held = false;
 };
 
-// True when path holds a file of the descriptor's size and last-write time (a descriptor that
-// does not give both never matches).
-bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor);
+// True when path holds a file of the descriptor's size and last-write time, as exactly as its
+// disk keeps times (a descriptor that does not give both never matches). --new, the watch and
+// --move's proof for a delete all ask this.
+bool IsAlreadyFetched(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk);

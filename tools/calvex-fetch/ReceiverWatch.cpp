@@ -143,6 +143,7 @@ bool ReceiverWatch::MoveTarget(const std::wstring& target) {
         return false;
     }
     if (m_lock) *m_lock = std::move(lock);
+    m_targetLost = false;  // the new folder was just written to
     const std::wstring log = m_target + L"\\calvex-fetch.log";
     if (lstrcmpiW(m_console.LogPath().c_str(), log.c_str()) == 0) {
         m_console.Line(L"the log goes on in " + target + L"\\calvex-fetch.log");
@@ -355,7 +356,7 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     watched.dirty = false;
     // No folder name or not opened when it came: left alone until plugged in again (its files
     // must never land in the target itself).
-    if (watched.folder.empty()) return;
+    if (watched.folder.empty() || !TargetReached(TargetDisk::Reach(m_target))) return;
     Reopen(watched);
     FetchTotals pass;
     const std::set<std::wstring> givenUpBefore = watched.givenUp;
@@ -379,7 +380,10 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
         return;
     }
     if (pass.fetched) watched.retried = false;
-    if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
+    if (FAILED(pass.targetLost)) {
+        // Nothing of the receiver failed: all it has comes once the target is back.
+        TargetReached(pass.targetLost);
+    } else if (pass.failed && (m_gone || !IsListed(watched, BrandOf(id)))) {
         // Cut by the unplug or by the device manager going away: what is missing is fetched
         // when the receiver is back (all receivers are dropped while the device manager is away).
         pass.failed = 0;
@@ -403,6 +407,16 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     m_totals.failed += pass.failed;
     m_totals.deleted += pass.deleted;
     m_totals.bytes += pass.bytes;
+}
+
+// One line when the target goes (a stick pulled, a share gone, the folder deleted) and one when
+// it is back; meanwhile receivers are left alone, and the next full comparison looks again.
+bool ReceiverWatch::TargetReached(HRESULT why) {
+    if (SUCCEEDED(why) && m_targetLost) m_console.Line(L"the target is back: " + m_target);
+    else if (FAILED(why) && !m_targetLost)
+        m_console.Line(TargetLostText(m_target, why) + L": waiting for it, looked for at each full comparison");
+    m_targetLost = FAILED(why);
+    return SUCCEEDED(why);
 }
 
 void ReceiverWatch::EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged) {

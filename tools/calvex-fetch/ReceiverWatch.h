@@ -82,6 +82,7 @@ private:
     void ApplySettings(const FetchOptions& wanted);
     bool MoveTarget(const std::wstring& target);
     bool PlaceFolder(Watched& watched, const std::wstring& title);
+    bool TargetReached(HRESULT why);
     void EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged);
     std::wstring Summary() const;
 
@@ -98,6 +99,7 @@ private:
     bool m_brandDirty[2] = {};
     bool m_plugging = false;  // after the first scan, a new receiver has been plugged in
     bool m_gone = false;
+    bool m_targetLost = false;  // said so; said again once it is back
     std::map<std::wstring, Watched> m_watched;  // by brand and key
     FetchTotals m_totals;
     WatchObserver* m_observer = nullptr;

@@ -1,11 +1,16 @@
 #include "TargetLock.h"
 
 #include <cstdio>
+#include <vector>
+
+#include "LongPath.h"
 
 std::wstring TargetLockName(const std::wstring& target) {
-    wchar_t longPath[MAX_PATH];
-    const DWORD length = GetLongPathNameW(target.c_str(), longPath, MAX_PATH);
-    std::wstring path = length && length < MAX_PATH ? longPath : target;
+    // The same folder by its short or its long names, however deep: one lock.
+    const std::wstring extended = LongPath(target);
+    std::vector<wchar_t> longPath(extended.size() + MAX_PATH);
+    const DWORD length = GetLongPathNameW(extended.c_str(), longPath.data(), static_cast<DWORD>(longPath.size()));
+    std::wstring path = FullPlainPath(length && length < longPath.size() ? std::wstring(longPath.data(), length) : target);
     while (path.size() > 3 && (path.back() == L'\\' || path.back() == L'/')) path.pop_back();
     CharUpperBuffW(&path[0], static_cast<DWORD>(path.size()));
     unsigned long long hash = 14695981039346656037ull;  // FNV-1a over the UTF-16 units

@@ -7,7 +7,7 @@
 const wchar_t kPartialSuffix[] = L".calvex-partial";
 
 namespace {
-constexpr size_t MaxPath = MAX_PATH - 1;  // characters, without the terminator
+constexpr size_t MaxName = 255;  // what file systems keep of one name
 
 bool IsSeparator(wchar_t c) { return c == L'\\' || c == L'/'; }
 
@@ -82,28 +82,32 @@ bool MakeSafeComponent(std::wstring& part, SafeName& result) {
     return true;
 }
 
-SafeName MakeSafeParts(std::vector<std::wstring> parts, size_t targetLength) {
+SafeName MakeSafeParts(std::vector<std::wstring> parts, size_t targetLength, size_t pathLimit) {
     SafeName result;
     std::wstring joined;
     for (std::wstring& part : parts) {
         if (!MakeSafeComponent(part, result)) return result;
         joined += (joined.empty() ? L"" : L"\\") + part;
     }
-    if (targetLength + 1 + joined.size() + wcslen(kPartialSuffix) > MaxPath) return Refuse(L"too long for the target folder");
+    // The last name also carries the temporary suffix while it is written.
+    if (parts.back().size() + wcslen(kPartialSuffix) > MaxName) return Refuse(L"too long for the target folder");
+    for (const std::wstring& part : parts)
+        if (part.size() > MaxName) return Refuse(L"too long for the target folder");
+    if (targetLength + 1 + joined.size() + wcslen(kPartialSuffix) > pathLimit) return Refuse(L"too long for the target folder");
     result.name = joined;
     return result;
 }
 }  // namespace
 
-SafeName MakeSafeDescriptorName(const std::wstring& name, size_t targetLength) {
+SafeName MakeSafeDescriptorName(const std::wstring& name, size_t targetLength, size_t pathLimit) {
     if (name.empty()) return Refuse(L"empty name");
     if (name.size() >= 2 && IsSeparator(name[0]) && IsSeparator(name[1])) return Refuse(L"UNC or device path");
     if (IsSeparator(name[0])) return Refuse(L"absolute path");
     if (name.size() >= 2 && name[1] == L':' && iswalpha(name[0])) return Refuse(L"drive prefix");
-    return MakeSafeParts(Split(name), targetLength);
+    return MakeSafeParts(Split(name), targetLength, pathLimit);
 }
 
-SafeName MakeSafeFolderName(const std::wstring& displayName, size_t targetLength) {
+SafeName MakeSafeFolderName(const std::wstring& displayName, size_t targetLength, size_t pathLimit) {
     std::wstring flat = displayName;
     bool changed = false;
     for (wchar_t& c : flat) {
@@ -111,7 +115,7 @@ SafeName MakeSafeFolderName(const std::wstring& displayName, size_t targetLength
         c = L'_';
         changed = true;
     }
-    SafeName result = MakeSafeParts({flat}, targetLength);
+    SafeName result = MakeSafeParts({flat}, targetLength, pathLimit);
     if (changed && !result.refused) Note(result, L"separators replaced");
     return result;
 }

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "DescriptorName.h"
+#include "LongPath.h"
 
 namespace {
 constexpr ULONG ChunkBytes = 1 << 20;
@@ -29,7 +30,7 @@ bool MakeParentFolders(const std::wstring& targetDir, const std::wstring& name) 
     for (size_t i = 0; i + 1 < parts.size(); ++i) {
         if (parts[i].empty()) continue;
         path += L"\\" + parts[i];
-        if (!CreateDirectoryW(path.c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
+        if (!CreateDirectoryW(LongPath(path).c_str(), nullptr) && GetLastError() != ERROR_ALREADY_EXISTS) return false;
     }
     return true;
 }
@@ -40,16 +41,46 @@ std::wstring ErrorText(const wchar_t* what, DWORD code) {
     return text;
 }
 
-HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written) {
+bool IsDiskFull(DWORD code) { return code == ERROR_DISK_FULL || code == ERROR_HANDLE_DISK_FULL; }
+
+// What went wrong writing to the disk, in words: a full disk is named as such.
+std::wstring WriteErrorText(const wchar_t* what, DWORD code) {
+    if (IsDiskFull(code)) return ErrorText(L"the disk is full", static_cast<DWORD>(HRESULT_FROM_WIN32(ERROR_DISK_FULL)));
+    return ErrorText(what, code);
+}
+
+// A short write (what a nearly full disk gives) is no end: the rest of the chunk is written
+// again until all of it is on the disk or the disk refuses.
+bool WriteWhole(HANDLE file, const BYTE* bytes, DWORD count) {
+    while (count) {
+        DWORD out = 0;
+        if (!WriteFile(file, bytes, count, &out, nullptr)) return false;
+        if (out == 0) {
+            SetLastError(ERROR_DISK_FULL);
+            return false;
+        }
+        bytes += out;
+        count -= out;
+    }
+    return true;
+}
+
+HRESULT CopyStream(IStream* stream, HANDLE file, ULONGLONG& written, std::wstring& error) {
     std::vector<BYTE> buffer(ChunkBytes);
     written = 0;
     for (;;) {
         ULONG read = 0;
         const HRESULT hr = stream->Read(buffer.data(), ChunkBytes, &read);
-        if (FAILED(hr)) return hr;
+        if (FAILED(hr)) {
+            error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
+            return hr;
+        }
         if (read == 0) return S_OK;
-        DWORD out = 0;
-        if (!WriteFile(file, buffer.data(), read, &out, nullptr) || out != read) return HRESULT_FROM_WIN32(GetLastError());
+        if (!WriteWhole(file, buffer.data(), read)) {
+            const DWORD code = GetLastError();
+            error = WriteErrorText(L"cannot write the file", code);
+            return HRESULT_FROM_WIN32(IsDiskFull(code) ? ERROR_DISK_FULL : code);
+        }
         written += read;
     }
 }
@@ -62,7 +93,7 @@ struct OnDisk {
 
 bool ReadOnDisk(const std::wstring& path, OnDisk& found) {
     WIN32_FILE_ATTRIBUTE_DATA data = {};
-    if (!GetFileAttributesExW(path.c_str(), GetFileExInfoStandard, &data)) return false;
+    if (!GetFileAttributesExW(LongPath(path).c_str(), GetFileExInfoStandard, &data)) return false;
     found.size = (static_cast<ULONGLONG>(data.nFileSizeHigh) << 32) | data.nFileSizeLow;
     found.time = data.ftLastWriteTime;
     return !(data.dwFileAttributes & FILE_ATTRIBUTE_DIRECTORY);
@@ -72,17 +103,17 @@ bool ReadOnDisk(const std::wstring& path, OnDisk& found) {
 // Wine's, is not the descriptor's).
 HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descriptor, IStream* stream,
                        std::wstring& error, OnDisk& flushed) {
-    HANDLE file = CreateFileW(path.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
+    HANDLE file = CreateFileW(LongPath(path).c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
     if (file == INVALID_HANDLE_VALUE) {
         error = ErrorText(L"cannot create the temporary file", GetLastError());
         return HRESULT_FROM_WIN32(GetLastError());
     }
     ULONGLONG written = 0;
-    HRESULT hr = CopyStream(stream, file, written);
+    HRESULT hr = CopyStream(stream, file, written, error);
     const ULONGLONG expected = DescriptorSize(descriptor);
     const FILETIME time = DescriptorWriteTime(descriptor);
     if (FAILED(hr)) {
-        error = ErrorText(L"reading the contents failed", static_cast<DWORD>(hr));
+        // CopyStream said whether the stream or the disk failed
     } else if ((descriptor.dwFlags & FD_FILESIZE) && written != expected) {
         error = L"size differs from the descriptor: " + std::to_wstring(written) + L" of " + std::to_wstring(expected);
         hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
@@ -91,7 +122,7 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
         hr = HRESULT_FROM_WIN32(GetLastError());
     } else if (!FlushFileBuffers(file) || !GetFileTime(file, nullptr, nullptr, &flushed.time)) {
         // On the disk before it gets its final name: a power cut leaves no short file there.
-        error = ErrorText(L"cannot flush the file to the disk", GetLastError());
+        error = WriteErrorText(L"cannot flush the file to the disk", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
     flushed.size = written;
@@ -101,13 +132,11 @@ HRESULT WriteTemporary(const std::wstring& path, const FILEDESCRIPTORW& descript
 
 // The last guard: whatever the name rules let through must still resolve below the target.
 bool IsInside(const std::wstring& targetDir, const std::wstring& path) {
-    wchar_t fullTarget[MAX_PATH], fullPath[MAX_PATH];
-    if (!GetFullPathNameW(targetDir.c_str(), MAX_PATH, fullTarget, nullptr) ||
-        !GetFullPathNameW(path.c_str(), MAX_PATH, fullPath, nullptr))
-        return false;
-    std::wstring prefix = fullTarget;
+    std::wstring prefix = FullPlainPath(targetDir);
+    const std::wstring fullPath = FullPlainPath(path);
     if (prefix.empty() || prefix.back() != L'\\') prefix += L'\\';
-    return CompareStringOrdinal(fullPath, static_cast<int>(prefix.size()), prefix.c_str(), static_cast<int>(prefix.size()),
+    return fullPath.size() > prefix.size() &&
+           CompareStringOrdinal(fullPath.c_str(), static_cast<int>(prefix.size()), prefix.c_str(), static_cast<int>(prefix.size()),
                                 TRUE) == CSTR_EQUAL;
 }
 
@@ -125,12 +154,13 @@ ULONGLONG DescriptorSize(const FILEDESCRIPTORW& descriptor) {
     return (static_cast<ULONGLONG>(descriptor.nFileSizeHigh) << 32) | descriptor.nFileSizeLow;
 }
 
-bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor) {
+bool IsOnDiskAsDescribed(const std::wstring& path, const FILEDESCRIPTORW& descriptor, TargetDisk& disk) {
     OnDisk found;
     if (!ReadOnDisk(path, found)) return false;
     const FILETIME time = DescriptorWriteTime(descriptor);
     if ((descriptor.dwFlags & FD_FILESIZE) && found.size != DescriptorSize(descriptor)) return false;
-    return !(descriptor.dwFlags & FD_WRITESTIME) || CompareFileTime(&found.time, &time) == 0;
+    return !(descriptor.dwFlags & FD_WRITESTIME) || SameTimeOnDisk(found.time, time, TimeKeeping::Seconds) ||
+           SameTimeOnDisk(found.time, time, disk.Keeping());
 }
 
 HRESULT ReadFileDescriptors(IDataObject* data, std::vector<FILEDESCRIPTORW>& files) {
@@ -170,8 +200,8 @@ HRESULT ReadFileContents(IDataObject* data, LONG index, IStream** stream) {
     return S_OK;
 }
 HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& descriptor, IStream* stream,
-                         std::wstring& error) {
-    const SafeName safe = MakeSafeDescriptorName(descriptor.cFileName, targetDir.size());
+                         std::wstring& error, size_t pathLimit) {
+    const SafeName safe = MakeSafeDescriptorName(descriptor.cFileName, targetDir.size(), pathLimit);
     if (safe.refused) {
         error = L"refused name: " + safe.reason;
         return E_ACCESSDENIED;
@@ -188,15 +218,16 @@ HRESULT WriteVirtualFile(const std::wstring& targetDir, const FILEDESCRIPTORW& d
     const std::wstring temporary = path + kPartialSuffix;
     OnDisk flushed, placed;
     HRESULT hr = WriteTemporary(temporary, descriptor, stream, error, flushed);
-    if (SUCCEEDED(hr) && !MoveFileExW(temporary.c_str(), path.c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
+    if (SUCCEEDED(hr) &&
+        !MoveFileExW(LongPath(temporary).c_str(), LongPath(path).c_str(), MOVEFILE_REPLACE_EXISTING | MOVEFILE_WRITE_THROUGH)) {
         error = ErrorText(L"cannot rename the temporary file", GetLastError());
         hr = HRESULT_FROM_WIN32(GetLastError());
     }
     if (FAILED(hr)) {
-        DeleteFileW(temporary.c_str());
+        DeleteFileW(LongPath(temporary).c_str());
     } else if (!ReadOnDisk(path, placed) || placed.size != flushed.size || CompareFileTime(&placed.time, &flushed.time)) {
         // Read back under its final name: what is not the file flushed does not stay there.
-        DeleteFileW(path.c_str());
+        DeleteFileW(LongPath(path).c_str());
         error = L"the file on the disk is not the one written after the rename";
         hr = HRESULT_FROM_WIN32(ERROR_INVALID_DATA);
     }
