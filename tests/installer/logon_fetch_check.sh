@@ -5,7 +5,8 @@
 # lands in FETCHDIR once with nothing partial, a log says what happened, a file logged while
 # the device manager restarts comes too; installed again with FETCHMOVE and FETCHLAYOUT, the
 # next logon moves every file into its place and empties the receivers; an upgrade to the
-# next version keeps the folder, moving and the layout; after /x a logon starts no watch.
+# next version keeps the folder, moving and the layout; a layout and the logon switch changed
+# as the settings window does survive a repair and the upgrade; after /x a logon starts no watch.
 # Guards against a logon value that does not start, quotes or points wrongly, a watch that
 # needs a console, and a removal that leaves the watch starting at each logon.
 set -u
@@ -65,12 +66,38 @@ moved=$(find "$survey/Calvex" "$survey/Brennor" -type f ! -name '*.calvex-partia
 cmp -s "$survey/Q9 GNSS@USB/LOG0099.qpr" "$survey/Calvex/Q9 GNSS@USB/LOG0099.qpr" || bad "LOG0099 filed wrongly"
 waitfor "$wlog" "Q9 GNSS@USB: 8 files in C:\Survey, 8 deleted from the receiver. Safe to unplug." 30
 
-# Upgraded to the next version without any property: the folder, moving and the layout stay.
+# Another layout chosen in the settings window (which stores it so): a repair keeps it, and the
+# next logon files a new file by it.
+key='HKCU\Software\Calvex\Receivers Shell Extension'
+stored() { "$run" reg query "$key" /v "$1" 2>/dev/null | tr -d '\r' | sed -n "s/^ *$1 *REG_SZ *//p"; }
+wineserver -k; wineserver -w
+"$run" reg add "$key" /v FetchLayout /d '{yyyy}\{receiver}' /f >/dev/null 2>&1
+"$run" msiexec /i "$msi" /qn REINSTALL=ALL REINSTALLMODE=omus || bad "the repair ended with $?"
+[ "$(stored FetchLayout)" = '{yyyy}\{receiver}' ] || bad "the repair changed the chosen layout to $(stored FetchLayout)"
+printf 'logged after the repair' >"$installed/sample-receivers/Calvex Q9 USB/LOG0098"
+logon
+for _ in $(seq 1 600); do [ -n "$(find "$survey" -name LOG0098.qpr)" ] && break; sleep 0.1; done
+[ -f "$survey/$(date +%Y)/Q9 GNSS@USB/LOG0098.qpr" ] || bad "LOG0098 not filed by the chosen layout: $(find "$survey" -name LOG0098.qpr)"
+
+# "Start at logon" turned off in the window: a repair keeps it off, and a logon starts no watch.
+wineserver -k; wineserver -w
+"$run" reg add "$key" /v FetchStartAtLogon /d 0 /f >/dev/null 2>&1
+"$run" msiexec /i "$msi" /qn REINSTALL=ALL REINSTALLMODE=omus || bad "the repair ended with $?"
+logon
+sleep 5
+watching && bad "a watch started at logon with start at logon off after a repair"
+
+# Upgraded to the next version without any property: the logon value starts the program, which
+# reads the folder, moving, the layout and the switch, all as they were.
 # (Windows carries the installed features over; Wine's msiexec does not, so they are named.)
 wineserver -k; wineserver -w
 "$run" msiexec /i "$next" /qn ADDLOCAL=ALL || bad "the upgrade ended with $?"
 value=$("$run" reg query 'HKCU\Software\Microsoft\Windows\CurrentVersion\Run' /v 'Calvex receivers watch' 2>/dev/null | tr -d '\r')
-case $value in *'calvex-fetchw.exe" --watch --move --layout "{brand}\{receiver}" "C:\Survey"'*) ;; *) bad "the logon value after the upgrade: $value" ;; esac
+case $value in *'calvex-fetchw.exe" --logon'*) ;; *) bad "the logon value after the upgrade: $value" ;; esac
+kept="$(stored FetchDir)|$(stored FetchMove)|$(stored FetchLayout)|$(stored FetchStartAtLogon)"
+[ "$kept" = 'C:\Survey|1|{yyyy}\{receiver}|0' ] || bad "the settings after the upgrade: $kept"
+"$run" reg add "$key" /v FetchStartAtLogon /d 1 /f >/dev/null 2>&1
+[ -n "$(find "$WINEPREFIX/drive_c" -name 'Calvex receivers download.lnk')" ] || bad "no Start menu entry"
 
 # Removed: the logon value goes, the fetched files and the log stay, a logon starts nothing.
 "$run" msiexec /x "$next" /qn || bad "msiexec /x ended with $?"

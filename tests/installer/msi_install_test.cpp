@@ -1,14 +1,16 @@
-// Guards the MSI: keys registration misses or leaves behind, files left after removal, a version that is not the DLL's, a repeated install or removal that breaks the first, a logon start of the automatic download that points elsewhere or outlives the product.
+// Guards the MSI: keys registration misses or leaves behind, files left after removal, a version that is not the DLL's, a repeated install or removal that breaks the first, a logon start of the automatic download that outlives the product, settings the properties do not seed, and a repair or upgrade that undoes what the user chose in the settings window.
 #include <windows.h>
 #include <msi.h>
 #include <shlobj.h>
 
 #include <cstdlib>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include <gtest/gtest.h>
 
+#include "FetchSettings.h"
 #include "support/DeviceSim.h"
 #include "support/RegistrationExpectations.h"
 #include "support/TestSupport.h"
@@ -53,17 +55,37 @@ void ExpectSamplesInstalled() {
 
 enum State { kNothing, kExtension, kExtensionAndSimulator };
 
-// What the logon start of the automatic download runs, for the folder and options the install was given.
-std::wstring RunCommand(const wchar_t* fetchDir, const wchar_t* options) {
-    if (!fetchDir) return L"<none>";
-    wchar_t documents[MAX_PATH] = L"";
-    SHGetFolderPathW(nullptr, CSIDL_PERSONAL, nullptr, SHGFP_TYPE_CURRENT, documents);
-    const std::wstring folder = *fetchDir ? fetchDir : std::wstring(documents) + L"\\Survey";
-    return L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --watch" + options + L" \"" + folder + L"\"";
+// The settings the logon start and the window share; target "" is the default folder.
+const FetchSettings kByDate = {L"C:\\Survey data", true, L"{receiver}\\{yyyy}\\{doy}"};
+const FetchSettings kChosen = {L"C:\\Chosen", false, L"{yyyy}\\{doy}\\{receiver}", false, false};
+
+// In the Start menu of all users, or of the installing user where the install is per user.
+bool HasStartMenuEntry() {
+    for (int folder : {CSIDL_COMMON_PROGRAMS, CSIDL_PROGRAMS}) {
+        wchar_t programs[MAX_PATH] = L"";
+        SHGetFolderPathW(nullptr, folder, nullptr, SHGFP_TYPE_CURRENT, programs);
+        if (FileExists(std::wstring(programs) + L"\\Calvex receivers download.lnk")) return true;
+    }
+    return false;
 }
 
-void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options = L"") {
-    EXPECT_EQ(RunCommand(fetchDir, options), RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
+// With the automatic download (stored non-null): one logon value, the Start menu entry and the
+// settings as the install, the user or a later install left them.
+void ExpectAutoFetch(const FetchSettings* stored) {
+    const std::wstring run = L"\"" + InstallDir() + L"\\calvex-fetchw.exe\" --logon";
+    EXPECT_EQ(stored ? run : L"<none>", RegistryText(HKEY_CURRENT_USER, kRun, L"Calvex receivers watch"));
+    EXPECT_EQ(stored != nullptr, HasStartMenuEntry());
+    if (!stored) return;
+    std::vector<std::wstring> damaged;
+    const FetchSettings s = LoadFetchSettings([&](const std::wstring& line) { damaged.push_back(line); });
+    EXPECT_TRUE(damaged.empty()) << Narrow(damaged.front());
+    EXPECT_EQ(std::make_tuple(stored->target.empty() ? DefaultFetchTarget() : stored->target, stored->move, stored->layout,
+                              stored->notify, stored->startAtLogon),
+              std::make_tuple(s.target, s.move, s.layout, s.notify, s.startAtLogon));
+}
+
+void ExpectState(State state, const FetchSettings* stored) {
+    ExpectAutoFetch(stored);
     EXPECT_EQ(state != kNothing, FileExists(InstallDir() + L"\\calvex-fetchw.exe"));
     const std::wstring dll = InstallDir() + L"\\CalvexReceiversShellExt.dll";
     const std::wstring sim = InstallDir() + L"\\CalvexDeviceSim.exe";
@@ -87,32 +109,41 @@ void ExpectState(State state, const wchar_t* fetchDir, const wchar_t* options = 
 
 TEST(MsiInstallTest, InstallsAndRemovesTheModuleAndItsOptionalFeatures) {
     ExpectState(kNothing, nullptr);
-    // fetchDir: the folder the logon start watches ("" the default), null when there is none;
-    // options: moving and the layout, kept by a repair (every component written again).
-    const wchar_t byDate[] = L" --move --layout \"{receiver}\\{yyyy}\\{doy}\"";
-    struct Step { const char* what; const wchar_t* arguments; State after; const wchar_t* fetchDir; bool mayBeUnknown; const wchar_t* options = L""; } steps[] = {
+    RegDeleteTreeW(HKEY_CURRENT_USER, kFetchSettingsKey);
+    // stored: the settings after the step, null without the automatic download; arguments null:
+    // the user's choice saved as the settings window saves it.
+    const FetchSettings movingOn = {L"C:\\Chosen", true, L"{yyyy}\\{doy}\\{receiver}", false, false};
+    const FetchSettings plain = {L"C:\\Chosen", true, L"{receiver}", false, false}, fresh = {L""};
+    struct Step { const char* what; const wchar_t* arguments; State after; const FetchSettings* stored; bool mayBeUnknown = false; } steps[] = {
         {"install everything", L"/i ADDLOCAL=ALL FETCHDIR=\"C:\\Survey data\" FETCHMOVE=1 FETCHLAYOUT=\"{receiver}\\{yyyy}\\{doy}\"",
-         kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
-        {"install again, the folder remembered", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
-        {"repair", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, L"C:\\Survey data", false, byDate},
-        {"repair, moving off", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHMOVE=0", kExtensionAndSimulator, L"C:\\Survey data",
-         false, byDate + 7},
-        {"repair, the plain layout again", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHLAYOUT={receiver}", kExtensionAndSimulator,
-         L"C:\\Survey data", false, L" --layout \"{receiver}\""},
-        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr, false},
-        {"uninstall", L"/x", kNothing, nullptr, false},
+         kExtensionAndSimulator, &kByDate},
+        {"install again, the settings kept", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, &kByDate},
+        {"repair", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, &kByDate},
+        {"chosen in the settings window", nullptr, kExtensionAndSimulator, &kChosen},
+        {"repair after the window's choice", L"/i REINSTALL=ALL REINSTALLMODE=omus", kExtensionAndSimulator, &kChosen},
+        {"install again after the window's choice", L"/i ADDLOCAL=ALL", kExtensionAndSimulator, &kChosen},
+        {"repair, moving on", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHMOVE=1", kExtensionAndSimulator, &movingOn},
+        {"repair, the plain layout again", L"/i REINSTALL=ALL REINSTALLMODE=omus FETCHLAYOUT={receiver}",
+         kExtensionAndSimulator, &plain},
+        {"remove the automatic download", L"/i REMOVE=AutoFetch", kExtensionAndSimulator, nullptr},
+        {"uninstall", L"/x", kNothing, nullptr},
         {"uninstall again", L"/x", kNothing, nullptr, true},  // Windows answers an unknown product
-        {"install the default features", L"/i", kExtension, nullptr, false},
-        {"uninstall", L"/x", kNothing, nullptr, false},
-        {"install the automatic download alone", L"/i ADDLOCAL=AutoFetch", kExtension, L"", false},
-        {"uninstall", L"/x", kNothing, nullptr, false},
+        {"install the default features", L"/i", kExtension, nullptr},
+        {"uninstall", L"/x", kNothing, nullptr},
+        {"install the automatic download alone", L"/i ADDLOCAL=AutoFetch", kExtension, &fresh},
+        {"uninstall", L"/x", kNothing, nullptr},
     };
-    const std::wstring msi = L" \"" + BuildDir() + L"\\CalvexReceiversShellExt.msi\" /qn";
     for (const Step& step : steps) {
         SCOPED_TRACE(step.what);
-        const std::wstring arguments = step.arguments;  // the action, then properties after the package
-        const DWORD exitCode = RunProcess(L"msiexec.exe " + arguments.substr(0, 2) + msi + arguments.substr(2), 300000);
-        EXPECT_TRUE(exitCode == 0 || (step.mayBeUnknown && exitCode == ERROR_UNKNOWN_PRODUCT)) << exitCode;
-        ExpectState(step.after, step.fetchDir, step.options);
+        if (step.arguments == nullptr) {
+            std::wstring error;
+            ASSERT_TRUE(SaveFetchSettings(kChosen, error)) << Narrow(error);
+        } else {
+            const std::wstring arguments = step.arguments;  // the action, then properties after the package
+            const std::wstring msi = L" \"" + BuildDir() + L"\\CalvexReceiversShellExt.msi\" /qn";
+            const DWORD exitCode = RunProcess(L"msiexec.exe " + arguments.substr(0, 2) + msi + arguments.substr(2), 300000);
+            EXPECT_TRUE(exitCode == 0 || (step.mayBeUnknown && exitCode == ERROR_UNKNOWN_PRODUCT)) << exitCode;
+        }
+        ExpectState(step.after, step.stored);
     }
 }

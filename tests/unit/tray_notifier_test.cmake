@@ -1,1 +1,1 @@
-set(TEST_LIBS calvex_fetch_core)
+set(TEST_LIBS calvex_fetchw_face)

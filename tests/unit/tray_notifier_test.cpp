@@ -45,3 +45,31 @@ TEST(TrayNotifierTest, SpeaksOfNewsOnly) {
     EXPECT_EQ(expected, logged);
     DeleteFileW(log.c_str());
 }
+
+// What the icon's menu reads: a pause's end stays where it was as time goes by; Recent and the notice's folder
+// follow the passes spoken of only.
+TEST(TrayNotifierTest, MenuSeesThePauseEndAndThePassesSpokenOf) {
+    FetchConsole console;
+    ULONGLONG now = 1000000;
+    TrayNotifier notifier(console, L"C:\\Survey", nullptr, [&] { return now; });
+    notifier.Paused(3600000);
+    struct Step { ULONGLONG after; ULONGLONG left; } steps[] = {{0, 3600000}, {20 * 60000, 40 * 60000}, {40 * 60000, 1}};
+    for (const Step& step : steps) {
+        now += step.after;
+        EXPECT_TRUE(notifier.View().status.paused);
+        EXPECT_EQ(step.left, notifier.View().status.pauseLeft) << step.after;
+    }
+    notifier.Idle();
+    EXPECT_FALSE(notifier.View().status.paused);
+    const wchar_t* folders[] = {L"C:\\Survey\\A@USB", L"C:\\Survey\\A@USB", L"C:\\Survey\\B@USB"};
+    for (const wchar_t* folder : folders) {
+        ReceiverPass pass;
+        pass.receiver = std::wstring(folder).substr(10), pass.target = L"C:\\Survey", pass.folder = folder, pass.files = 1;
+        notifier.PassEnded(pass);  // the second, of A with nothing new, is no news
+    }
+    const WatchView view = notifier.View();
+    ASSERT_EQ(2u, view.recent.Newest().size());
+    EXPECT_EQ(L"C:\\Survey\\B@USB", view.recent.Newest()[0].folder);
+    EXPECT_EQ(L"B@USB: 1 file in C:\\Survey. Safe to unplug.", view.recent.Newest()[0].notice);
+    EXPECT_EQ(L"C:\\Survey\\B@USB", view.noticeFolder);
+}

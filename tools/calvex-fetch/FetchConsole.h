@@ -16,6 +16,7 @@ public:
     // Every later line starts with the local time, for a console left open all day.
     void SetStamped(bool stamped) { m_stamped = stamped; }
     void SetLog(const std::wstring& path) { m_log.Open(path); }
+    const std::wstring& LogPath() const { return m_log.Path(); }
     void Line(const std::wstring& text);
     void Error(const std::wstring& text);  // "calvex-fetch: " + text on stderr
     // Redraws the file's progress bar in place; nothing when stdout is not a terminal.

@@ -20,14 +20,17 @@ bool SetBrand(const std::wstring& brand, FetchOptions& options) {
 }
 }  // namespace
 
+bool FetchOptionTakesValue(const std::wstring& argument) {
+    return argument == L"--brand" || argument == L"--receiver" || argument == L"--log" || argument == L"--layout";
+}
+
 bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions& options, std::wstring& error) {
     options = FetchOptions();
     bool newOnly = false;
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::wstring& argument = arguments[i];
         const bool hasValue = i + 1 < arguments.size();
-        if (argument == L"--brand" || argument == L"--receiver" || argument == L"--log" ||
-            argument == L"--layout") {
+        if (FetchOptionTakesValue(argument)) {
             if (!hasValue) return Fail(error, argument + L" needs a value");
             const std::wstring& value = arguments[++i];
             if (argument == L"--receiver") options.receivers.push_back(value);

@@ -19,5 +19,8 @@ struct FetchOptions {
 
 extern const wchar_t kFetchUsage[];
 
+// --brand, --receiver, --log and --layout: the next argument is their value.
+bool FetchOptionTakesValue(const std::wstring& argument);
+
 // The arguments after the program's name. False with the reason on bad usage.
 bool ParseFetchOptions(const std::vector<std::wstring>& arguments, FetchOptions& options, std::wstring& error);

@@ -58,6 +58,10 @@ void ReceiverFetcher::Run(IShellFolder* files, const Receiver& receiver, const s
     const int failedBefore = m_totals.failed;
     for (size_t i = 0; i < items.size(); ++i) {
         if (m_interrupted || FAILED(m_totals.targetLost) || (m_givenUp && m_totals.failed > failedBefore)) return;
+        if (m_hold && m_hold()) {
+            m_held = true;
+            return;
+        }
         if (m_tell) m_tell(static_cast<int>(items.size() - i));
         FetchItem(files, items[i].get());
     }

@@ -52,6 +52,9 @@ public:
     }
     // Told before each file how many of the receiver's files are left, this one included.
     void OnEachFile(std::function<void(int left)> tell) { m_tell = std::move(tell); }
+    // Asked before each file: true stops the run there (a pause, new settings); Held() says so.
+    void HoldBetweenFiles(std::function<bool()> hold) { m_hold = std::move(hold); }
+    bool Held() const { return m_held; }
 
 private:
     void FetchItem(IShellFolder* receiver, PCUITEMID_CHILD item);
@@ -84,6 +87,8 @@ private:
     bool m_watching = false;
     std::set<std::wstring>* m_givenUp = nullptr;
     std::function<void(int)> m_tell;
+    std::function<bool()> m_hold;
+    bool m_held = false;
 };
 
 // True when path holds a file of the descriptor's size and last-write time, as exactly as its

@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "DescriptorName.h"
+#include "FetchRun.h"
 
 namespace {
 // How often the device manager is asked whether it is still there (the product's download
@@ -20,6 +21,19 @@ std::wstring Duration(ULONGLONG milliseconds) {
     else if (milliseconds < 3600000) swprintf(text, 32, L"%.1f min", milliseconds / 60000.0);
     else swprintf(text, 32, L"%.1f h", milliseconds / 3600000.0);
     return text;
+}
+// The part of a receiver's folder above its first date folder, "\\Q7_RTK@COM3", or empty.
+std::wstring UndatedFolder(const std::wstring& shown) {
+    const size_t date = shown.find(L'{');
+    if (date == std::wstring::npos) return L"\\" + shown;
+    const size_t cut = shown.rfind(L'\\', date);
+    return cut == std::wstring::npos ? std::wstring() : L"\\" + shown.substr(0, cut);
+}
+
+// Whether the pause told to the observer (an end tick, 1 until resumed) is another one now.
+bool IsOtherPause(ULONGLONG told, ULONGLONG until) {
+    if (!told || (told == 1) != (until == 1)) return true;
+    return until != 1 && (until > told + 1000 || until + 1000 < told);
 }
 }  // namespace
 
@@ -40,13 +54,22 @@ int ReceiverWatch::Run() {
     m_started = GetTickCount64();
     ULONGLONG nextProbe = m_started + kLivenessMs, nextRescan = m_started + kRescanMs;
     while (!m_interrupted) {
+        TakeCommands();
+        if (m_control && m_control->IsPaused()) {
+            TellPaused();
+            const ULONGLONG left = m_control->PauseLeft();
+            WaitForWork(static_cast<DWORD>(left && left < kLivenessMs ? left : kLivenessMs));
+            continue;
+        }
+        m_pausedUntil = 0;
         if (m_gone) {
             TellIdle();
             Reconnect();
             nextRescan = GetTickCount64() + kRescanMs;
             continue;
         }
-        while (AnyDirty() && !m_interrupted && !m_gone) ProcessDirty();
+        while (AnyDirty() && !m_interrupted && !m_gone && !Held()) ProcessDirty();
+        if (Held()) continue;
         m_plugging = true;
         const ULONGLONG now = GetTickCount64();
         if (now >= nextProbe) {
@@ -54,13 +77,7 @@ int ReceiverWatch::Run() {
             nextProbe = now + kLivenessMs;
         }
         if (now >= nextRescan) {
-            for (int brand = 0; brand < 2; ++brand) m_brandDirty[brand] = static_cast<bool>(m_brands[brand]);
-            // Files given up are tried again too: a receiver unplugged and plugged back between
-            // two looks is not seen to go, and its failed files would wait for the next start.
-            for (auto& entry : m_watched) {
-                entry.second.dirty = true;
-                entry.second.givenUp.clear();
-            }
+            CompareAllAgain();
             nextRescan = now + kRescanMs;
         }
         if (!AnyDirty() && !m_gone) TellIdle();
@@ -68,6 +85,90 @@ int ReceiverWatch::Run() {
     }
     m_console.Line(Summary());
     return m_totals.failed ? 1 : 0;
+}
+
+void ReceiverWatch::CompareAllAgain() {
+    for (int brand = 0; brand < 2; ++brand) m_brandDirty[brand] = static_cast<bool>(m_brands[brand]);
+    // Files given up are tried again too: a receiver unplugged and plugged back between
+    // two looks is not seen to go, and its failed files would wait for the next start.
+    for (auto& entry : m_watched) {
+        entry.second.dirty = true;
+        entry.second.givenUp.clear();
+    }
+}
+
+bool ReceiverWatch::Held() { return m_control && m_control->Holds(); }
+
+void ReceiverWatch::TakeCommands() {
+    if (!m_control) return;
+    FetchOptions wanted;
+    if (m_control->TakeSettings(wanted)) ApplySettings(wanted);
+    if (!m_control->TakeFullComparison()) return;
+    m_console.Line(L"every receiver is compared in full");
+    CompareAllAgain();
+}
+
+// Between files: what is being fetched now lands where it was going; every receiver is then
+// compared in full against the new settings.
+void ReceiverWatch::ApplySettings(const FetchOptions& wanted) {
+    std::wstring error;
+    LayoutPattern layout;
+    if (!layout.Parse(wanted.layout, error)) return m_console.Line(L"settings not applied: --layout: " + error);
+    const std::wstring target = FullPath(wanted.target);
+    if (lstrcmpiW(target.c_str(), m_target.c_str()) != 0 && !MoveTarget(target)) return;
+    m_options.target = wanted.target;
+    m_options.move = wanted.move;
+    m_options.layout = wanted.layout;
+    m_options.notify = wanted.notify;
+    m_layout = layout;
+    m_console.Line(L"settings applied: new files into " + m_target + L"\\" + m_options.layout +
+                   (m_options.move ? L", each receiver emptied once its files are safe" : L""));
+    for (auto& entry : m_watched) {
+        Watched& watched = entry.second;
+        watched.givenUp.clear();
+        watched.dirty = PlaceFolder(watched, watched.receiver.Title());
+    }
+    if (m_observer) m_observer->SettingsApplied(m_options, m_target);
+}
+
+// The lock and a log kept in the target go with it; the old folder is free for another watch.
+bool ReceiverWatch::MoveTarget(const std::wstring& target) {
+    if (!IsWritableFolder(target)) {
+        m_console.Line(L"settings not applied: target not writable: " + target);
+        return false;
+    }
+    TargetLock lock;
+    if (!lock.Acquire(target)) {
+        m_console.Line(L"settings not applied: another calvex-fetch is fetching into " + target + L" already");
+        return false;
+    }
+    if (m_lock) *m_lock = std::move(lock);
+    m_targetLost = false;  // the new folder was just written to
+    const std::wstring log = m_target + L"\\calvex-fetch.log";
+    if (lstrcmpiW(m_console.LogPath().c_str(), log.c_str()) == 0) {
+        m_console.Line(L"the log goes on in " + target + L"\\calvex-fetch.log");
+        m_console.SetLog(target + L"\\calvex-fetch.log");
+    }
+    m_target = target;
+    return true;
+}
+
+void ReceiverWatch::TellPaused() {
+    const ULONGLONG left = m_control->PauseLeft();
+    const ULONGLONG until = left ? GetTickCount64() + left : 1;
+    if (!IsOtherPause(m_pausedUntil, until)) return;  // told already
+    if (!m_pausedUntil)
+        m_console.Line(left ? L"paused for " + std::to_wstring((left + 30000) / 60000) + L" min" : L"paused until resumed");
+    m_pausedUntil = until;
+    m_idle = false;
+    if (m_observer) m_observer->Paused(left);
+}
+
+void ReceiverWatch::TellConnected() {
+    if (!m_observer) return;
+    std::vector<LayoutReceiver> receivers;
+    for (const auto& entry : m_watched) receivers.push_back(entry.second.receiver.Fields());
+    m_observer->Connected(receivers);
 }
 
 bool ReceiverWatch::Start() {
@@ -122,6 +223,7 @@ HRESULT ReceiverWatch::BindBrands() {
 // growing pause, and once it answers every receiver is compared in full, as after a replug.
 void ReceiverWatch::Reconnect() {
     m_watched.clear();
+    TellConnected();
     for (ComPtr<IShellFolder>& brand : m_brands) brand.Reset();
     m_manager.Reset();
     for (size_t attempt = 0; !m_interrupted; ++attempt) {
@@ -209,28 +311,42 @@ void ReceiverWatch::ScanBrand(int brand) {
         m_console.Line(entry->second.receiver.Title() + L" unplugged");
         entry = m_watched.erase(entry);
     }
+    TellConnected();
 }
 
 void ReceiverWatch::Add(Receiver receiver, int brand) {
     const std::wstring title = receiver.Title() + (m_plugging ? L" plugged in" : L"");
-    const SafeName folder = m_layout.Check(receiver.Fields(), m_target.size());
     Watched watched;
+    const std::wstring id = WatchId(brand, receiver.key);
+    watched.receiver = std::move(receiver);
+    const Receiver& added = watched.receiver;
+    if (FAILED(added.parent->BindToObject(added.item.get(), nullptr, IID_IShellFolder, watched.files.PutVoid()))) {
+        // Its folder name is checked first: a receiver without one is never opened.
+        if (!m_layout.Check(added.Fields(), m_target.size()).refused) {
+            ++m_totals.failed;
+            m_console.Line(title + L": FAILED, the receiver cannot be opened");
+            watched.dirty = false;
+            m_watched.emplace(id, std::move(watched));
+            return;
+        }
+    }
+    watched.dirty = PlaceFolder(watched, title);
+    m_watched.emplace(id, std::move(watched));
+}
+
+// Its folder below the target by the layout, and its line; false when the fields make no
+// name: left alone until plugged in again (or new settings).
+bool ReceiverWatch::PlaceFolder(Watched& watched, const std::wstring& title) {
+    const SafeName folder = m_layout.Check(watched.receiver.Fields(), m_target.size());
+    watched.folder.clear();
     if (folder.refused) {
         ++m_totals.failed;
         m_console.Line(title + L": FAILED, no folder name: " + folder.reason);
-        watched.dirty = false;  // left alone until plugged in again
-    } else if (FAILED(receiver.parent->BindToObject(receiver.item.get(), nullptr, IID_IShellFolder,
-                                                    watched.files.PutVoid()))) {
-        ++m_totals.failed;
-        m_console.Line(title + L": FAILED, the receiver cannot be opened");
-        watched.dirty = false;
-    } else {
-        watched.folder = m_layout.Shown(receiver.Fields());
-        m_console.Line(title + L" -> " + m_target + L"\\" + watched.folder);
+        return false;
     }
-    const std::wstring id = WatchId(brand, receiver.key);
-    watched.receiver = std::move(receiver);
-    m_watched.emplace(id, std::move(watched));
+    watched.folder = m_layout.Shown(watched.receiver.Fields());
+    m_console.Line(title + L" -> " + m_target + L"\\" + watched.folder);
+    return true;
 }
 
 void ReceiverWatch::FetchNew(const std::wstring& id) {
@@ -252,7 +368,17 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
         const std::wstring display = watched.receiver.display;
         fetcher.OnEachFile([observer, display](int left) { observer->Working(display, left); });
     }
+    fetcher.HoldBetweenFiles([this] { return Held(); });
     fetcher.Run(watched.files.Get(), watched.receiver, m_target);
+    if (fetcher.Held()) {
+        // Paused or new settings: the pass goes on from the start once they are taken.
+        watched.dirty = true;
+        watched.givenUp = givenUpBefore;
+        m_totals.fetched += pass.fetched;
+        m_totals.deleted += pass.deleted;
+        m_totals.bytes += pass.bytes;
+        return;
+    }
     if (pass.fetched) watched.retried = false;
     if (FAILED(pass.targetLost)) {
         // Nothing of the receiver failed: all it has comes once the target is back.
@@ -298,6 +424,7 @@ void ReceiverWatch::EndPass(const Watched& watched, const FetchTotals& pass, boo
     ReceiverPass ended;
     ended.receiver = watched.receiver.display;
     ended.target = m_target;
+    ended.folder = m_target + UndatedFolder(watched.folder);
     ended.files = pass.fetched + pass.skipped;
     ended.fetched = pass.fetched;
     ended.failed = pass.failed;
@@ -341,7 +468,8 @@ bool ReceiverWatch::DeviceManagerGone() {
 }
 
 void ReceiverWatch::WaitForWork(DWORD milliseconds) {
-    MsgWaitForMultipleObjects(1, &m_stop, FALSE, milliseconds, QS_ALLINPUT);
+    const HANDLE wake[] = {m_stop, m_control ? m_control->WakeEvent() : m_stop};
+    MsgWaitForMultipleObjects(2, wake, FALSE, milliseconds, QS_ALLINPUT);
     MSG message;
     while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) {
         TranslateMessage(&message);

@@ -19,6 +19,8 @@
 #include "ReceiverList.h"
 #include "ReceiverPass.h"
 #include "ShellChangeListener.h"
+#include "TargetLock.h"
+#include "WatchControl.h"
 
 // The pause before the attempt-th new try (from 0) while the device manager is away.
 ULONGLONG ReconnectPauseSeconds(size_t attempt);
@@ -26,12 +28,22 @@ ULONGLONG ReconnectPauseSeconds(size_t attempt);
 class ReceiverWatch {
 public:
     // interrupted and stop are set by the console's Ctrl+C handler; layout is options.layout,
-    // parsed before the watch starts (a bad pattern never gets this far).
+    // parsed before the watch starts (a bad pattern never gets this far). The watch keeps its
+    // own copies: new settings may replace them while it runs (SetControl).
     ReceiverWatch(const FetchOptions& options, const LayoutPattern& layout, const std::wstring& target,
                   FetchConsole& console, const std::atomic<bool>& interrupted, HANDLE stop);
 
     // Who hears where the watch stands, on this thread; null: nobody.
     void SetObserver(WatchObserver* observer) { m_observer = observer; }
+    const FetchOptions& Options() const { return m_options; }
+    const std::wstring& Target() const { return m_target; }
+    FetchConsole& Console() { return m_console; }
+    // Commands from another thread (WatchControl.h), taken between files; lock holds the
+    // target and follows it when new settings name another folder.
+    void SetControl(WatchControl* control, TargetLock* lock) {
+        m_control = control;
+        m_lock = lock;
+    }
 
     // 0 when stopped and nothing failed, 1 when something failed, 2 when it could not start
     // (the reason on stderr). A device manager that is not there yet, or goes away, is waited for.
@@ -62,13 +74,21 @@ private:
     bool DeviceManagerGone();
     void WaitForWork(DWORD milliseconds);
     void TellIdle();
+    void TellPaused();
+    void TellConnected();
+    bool Held();
+    void TakeCommands();
+    void CompareAllAgain();
+    void ApplySettings(const FetchOptions& wanted);
+    bool MoveTarget(const std::wstring& target);
+    bool PlaceFolder(Watched& watched, const std::wstring& title);
     bool TargetReached(HRESULT why);
     void EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged);
     std::wstring Summary() const;
 
-    const FetchOptions& m_options;
-    const LayoutPattern& m_layout;
-    const std::wstring m_target;
+    FetchOptions m_options;
+    LayoutPattern m_layout;
+    std::wstring m_target;
     FetchConsole& m_console;
     const std::atomic<bool>& m_interrupted;
     HANDLE m_stop;
@@ -83,6 +103,9 @@ private:
     std::map<std::wstring, Watched> m_watched;  // by brand and key
     FetchTotals m_totals;
     WatchObserver* m_observer = nullptr;
+    WatchControl* m_control = nullptr;
+    TargetLock* m_lock = nullptr;
+    ULONGLONG m_pausedUntil = 0;  // as told to the observer (a tick), 0 when not paused; 1 until resumed
     bool m_idle = false;  // Idle told, and no work since
     ULONGLONG m_started = 0;
 };

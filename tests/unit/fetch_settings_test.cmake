@@ -1,0 +1,2 @@
+# The stored settings of calvex-fetchw, on a scratch key of the test prefix.
+set(TEST_LIBS calvex_fetchw_face)

@@ -1,0 +1,1 @@
+set(TEST_LIBS calvex_fetch_core)
