@@ -321,7 +321,8 @@ void ReceiverWatch::Add(Receiver receiver, int brand) {
     watched.receiver = std::move(receiver);
     const Receiver& added = watched.receiver;
     if (FAILED(added.parent->BindToObject(added.item.get(), nullptr, IID_IShellFolder, watched.files.PutVoid()))) {
-        // Its folder name is checked first: a receiver without one is never opened.
+        // Opened even when its fields make no folder name, since new settings may give it one;
+        // when both fail, the missing name is what is said.
         if (!m_layout.Check(added.Fields(), m_target.size()).refused) {
             ++m_totals.failed;
             m_console.Line(title + L": FAILED, the receiver cannot be opened");
@@ -371,13 +372,12 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
     fetcher.HoldBetweenFiles([this] { return Held(); });
     fetcher.Run(watched.files.Get(), watched.receiver, m_target);
     if (fetcher.Held()) {
-        // Paused or new settings: the pass goes on from the start once they are taken.
+        // Paused or new settings: the pass goes on from the start once they are taken, and
+        // what failed in it is tried again then.
         watched.dirty = true;
         watched.givenUp = givenUpBefore;
-        m_totals.fetched += pass.fetched;
-        m_totals.deleted += pass.deleted;
-        m_totals.bytes += pass.bytes;
-        return;
+        pass.failed = 0;
+        return AddToTotals(pass);
     }
     if (pass.fetched) watched.retried = false;
     if (FAILED(pass.targetLost)) {
@@ -403,6 +403,10 @@ void ReceiverWatch::FetchNew(const std::wstring& id) {
         watched.dirty = watched.dirty || pass.failed;
         EndPass(watched, pass, false);
     }
+    AddToTotals(pass);
+}
+
+void ReceiverWatch::AddToTotals(const FetchTotals& pass) {
     m_totals.fetched += pass.fetched;
     m_totals.failed += pass.failed;
     m_totals.deleted += pass.deleted;

@@ -83,6 +83,7 @@ private:
     bool MoveTarget(const std::wstring& target);
     bool PlaceFolder(Watched& watched, const std::wstring& title);
     bool TargetReached(HRESULT why);
+    void AddToTotals(const FetchTotals& pass);
     void EndPass(const Watched& watched, const FetchTotals& pass, bool unplugged);
     std::wstring Summary() const;
 
